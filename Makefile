@@ -1,0 +1,25 @@
+# Front door for developers and CI. Every target builds in a folder of its own.
+BUILD_TEST ?= build/asan
+BUILD_REL ?= build/release
+JOBS ?= $(shell nproc)
+
+.PHONY: all build test format clean
+
+all: build
+
+build:
+	cmake -S . -B $(BUILD_REL) -G Ninja -DCMAKE_BUILD_TYPE=RelWithDebInfo
+	cmake --build $(BUILD_REL) -j $(JOBS)
+
+# The whole suite, built with AddressSanitizer and UndefinedBehaviorSanitizer.
+test:
+	cmake -S . -B $(BUILD_TEST) -G Ninja -DCMAKE_BUILD_TYPE=Debug -DZR7_SANITIZE=ON
+	cmake --build $(BUILD_TEST) -j $(JOBS)
+	ASAN_OPTIONS=detect_leaks=1:abort_on_error=0 UBSAN_OPTIONS=print_stacktrace=1:halt_on_error=1 \
+		ctest --test-dir $(BUILD_TEST) --output-on-failure -j $(JOBS)
+
+format:
+	find qsd tests -name '*.cpp' -o -name '*.h' | xargs clang-format -i
+
+clean:
+	rm -rf build

@@ -1,0 +1,38 @@
+// The reading rules of the server configuration file kmsenv, over its text.
+#pragma once
+
+#include <string>
+
+#include "qsd/text/text.h"
+
+namespace zr7 {
+
+// What the reader fills in. Start it from the installer's members: a server
+// name that is already set decides which records are read.
+struct ServerConfig {
+    std::string server_name;
+    std::string arch;
+    std::string protocol;
+    std::string port;
+    std::string host_name;
+    std::string family_setting;
+};
+
+struct KmsenvResult {
+    ServerConfig config;
+    // Detail lines for the trace ("MSRV name <...>").
+    StringList detail_lines;
+};
+
+// Reads the whole file content. Lines are taken whole and without their
+// "\n" or "\r\n"; empty lines are skipped. Until a "FIELDSEP=..." line the
+// lines are headings; after it every line is a record "owner|key|value"
+// split at any byte of the separator set. "default" records are skipped, the
+// first other owner names the server (unless one is named already), and the
+// first record of another server ends the reading.
+KmsenvResult read_kmsenv(const std::string& content, const ServerConfig& start);
+
+// "KDC_FAMILIES=PORT:" port " " protocol " USE:Y".
+std::string family_setting_for(const std::string& port, const std::string& protocol);
+
+}  // namespace zr7

@@ -1,0 +1,32 @@
+#include "qsd/driver/getopt.h"
+
+#include <cstring>
+
+char GetOpt::next() {
+    argument = nullptr;
+    if (index >= argc)
+        return 0;
+    const char* a = argv[index];
+    if (a[0] != '-')
+        return 0;
+    if (a[1] == '-' || a[1] == '\0') {
+        ++index;
+        return 0;
+    }
+    const char letter = a[1];
+    const char* spec = letter == ':' ? nullptr : std::strchr(option_string, letter);
+    if (spec == nullptr)
+        return '?';
+    if (spec[1] == ':') {
+        if (a[2] != '\0') {
+            argument = a + 2;
+        } else {
+            ++index;
+            if (index >= argc)
+                return '?';
+            argument = argv[index];
+        }
+    }
+    ++index;
+    return letter;
+}

@@ -1,0 +1,52 @@
+#include <sys/stat.h>
+
+#include "qsd/fileops/install_util.h"
+#include "qsd/platform/process.h"
+#include "qsd/platform/trace.h"
+
+// The command texts below are what the trace shows an administrator; the copy
+// itself runs `cp` or `tr` with an argument vector, so no byte of a file name
+// ever reaches a shell.
+int InstallUtil::copy_file(const char* src, const char* dst, unsigned flags) {
+    ZR7_TRACED("InstallUtil::copy_file");
+    const int overwrite = (flags & kCopyOverwrite) != 0 ? 1 : 0;
+    const int fix_cr = (flags & kCopyFixCr) != 0 ? 1 : 0;
+    ZR7_DETAIL("Copy begin --------------");
+    ZR7_DETAIL("...src <%s>", src);
+    ZR7_DETAIL("...dst <%s>", dst);
+    ZR7_DETAIL("...overwrite <%d> fix cr <%d>", overwrite, fix_cr);
+
+    struct stat st {};
+    if (overwrite == 0 && ::stat(dst, &st) == 0) {
+        ZR7_DETAIL("...file already exists");
+        ZR7_DETAIL("Copy end ----------------");
+        return 0;
+    }
+
+    zr7::ProcessSpec spec;
+    if (fix_cr != 0) {
+        if (zr7_trace.detail()) {
+            std::string shown = "tr -d '\r' <" + quote_str(src) + " >" + quote_str(dst);
+            ZR7_DETAIL("...issuing cmd <%s>", shown.c_str());
+        }
+        spec.program = "tr";
+        spec.args = {"-d", "\r"};
+        spec.stdin_path = src;
+        spec.stdout_path = dst;
+        spec.stdout_mode = zr7::OutputMode::kTruncate;
+    } else {
+        if (zr7_trace.detail()) {
+            std::string shown = "cp -f " + quote_str(src) + " " + quote_str(dst);
+            ZR7_DETAIL("...issuing cmd <%s>", shown.c_str());
+        }
+        spec.program = "cp";
+        spec.args = {"-f", "--", src, dst};
+    }
+
+    const int status = zr7::run_process(spec) == 0 ? 0 : -5;
+    if (status == 0)
+        removeReadOnly(dst);
+    ZR7_DETAIL("...rc = <%d>", status);
+    ZR7_DETAIL("Copy end ----------------");
+    return status;
+}

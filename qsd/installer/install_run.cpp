@@ -1,0 +1,69 @@
+#include "qsd/fileops/install_util.h"
+#include "qsd/installer/installer610.h"
+#include "qsd/platform/progress.h"
+#include "qsd/platform/trace.h"
+
+int Installer610::init(const std::string& src_dir, const std::string& home_dir) {
+    ZR7_OPERATION("Installer610::init");
+    source_path = src_dir;
+    home_path = home_dir.empty() ? "./" : home_dir;
+    int status = read_config(home_path);
+    if (status == 0) {
+        tmp_path = InstallUtil::get_tmp_path();
+        host_name = InstallUtil::get_hostname();
+    }
+    add_path_symbol("HOMEPATH", home_path.c_str());
+    add_path_symbol("SRCPATH", source_path.c_str());
+    add_symbol("BINARCH", arch.c_str());
+    add_symbol("QMSNAME", server_name.c_str());
+    ZR7_DETAIL("src path....<%s>", source_path.c_str());
+    ZR7_DETAIL("home path...<%s>", home_path.c_str());
+    ZR7_DETAIL("tmp path....<%s>", tmp_path.c_str());
+    ZR7_DETAIL("protocol....<%s>", protocol.c_str());
+    ZR7_DETAIL("hostname....<%s>", host_name.c_str());
+    ZR7_DETAIL("port........<%s>", port.c_str());
+    ZR7_DETAIL("qms name....<%s>", server_name.c_str());
+    ZR7_DETAIL("binarch.....<%s>", arch.c_str());
+    ZR7_DETAIL("rc..........<%d>", status);
+    ZR7_RETURN(status);
+}
+
+int Installer610::go() {
+    ZR7_OPERATION("Installer610::go");
+    if (copying == 0)
+        ZR7_DETAIL("Copying disabled");
+    if (seeding == 0)
+        ZR7_DETAIL("Seeding disabled");
+    CommandList commands = build_command_list(copying != 0, seeding != 0);
+    const int status = process_commands(commands);
+    ZR7_RETURN(status);
+}
+
+int Installer610::process_commands(CommandList& commands) {
+    ZR7_OPERATION("Installer610::process_commands");
+    int status = 0;
+    for (std::size_t i = 0; i < commands.size(); ++i) {
+        const SimpleCommand& command = commands[i];
+        zr7::progress_command(static_cast<int>(i + 1), static_cast<int>(commands.size()),
+                              command.kind, command.source);
+        switch (command.kind) {
+            case kFlatCopy:
+                status = copy(command.source, command.destination);
+                break;
+            case kTreeCopy:
+                status = recursive_copy(command.source, command.destination, command.options);
+                break;
+            case kUpdateEnv:
+                status = update_vxaenv(command.source);
+                break;
+            case kSeed:
+                status = seed(command.source, command.destination);
+                break;
+            default:
+                break;
+        }
+        if (status < 0)
+            ZR7_RETURN(status);
+    }
+    ZR7_RETURN(0);
+}

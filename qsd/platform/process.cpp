@@ -1,0 +1,131 @@
+#include "qsd/platform/process.h"
+
+#include <fcntl.h>
+#include <spawn.h>
+#include <sys/stat.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstdio>
+#include <cstdlib>
+#include <map>
+#include <utility>
+
+extern char** environ;
+
+namespace zr7 {
+
+namespace {
+
+bool is_executable_file(const std::string& path) {
+    struct stat st {};
+    return ::stat(path.c_str(), &st) == 0 && S_ISREG(st.st_mode) &&
+           ::access(path.c_str(), X_OK) == 0;
+}
+
+class FdGuard {
+  public:
+    explicit FdGuard(int fd = -1) : fd_(fd) {}
+    ~FdGuard() {
+        if (fd_ >= 0)
+            ::close(fd_);
+    }
+    FdGuard(const FdGuard&) = delete;
+    FdGuard& operator=(const FdGuard&) = delete;
+    int get() const { return fd_; }
+
+  private:
+    int fd_;
+};
+
+}  // namespace
+
+std::string find_on_path(const std::string& program) {
+    if (program.empty())
+        return std::string();
+    if (program.find('/') != std::string::npos)
+        return program;
+    const char* env = std::getenv("PATH");
+    std::string path_value = env == nullptr ? "/usr/bin:/bin" : env;
+
+    static std::map<std::pair<std::string, std::string>, std::string> cache;
+    auto key = std::make_pair(program, path_value);
+    auto hit = cache.find(key);
+    if (hit != cache.end() && !hit->second.empty() && is_executable_file(hit->second)) {
+        return hit->second;
+    }
+
+    std::string found;
+    std::size_t start = 0;
+    while (start <= path_value.size()) {
+        std::size_t colon = path_value.find(':', start);
+        if (colon == std::string::npos)
+            colon = path_value.size();
+        std::string dir = path_value.substr(start, colon - start);
+        if (dir.empty())
+            dir = ".";
+        std::string candidate = dir + "/" + program;
+        if (is_executable_file(candidate)) {
+            found = candidate;
+            break;
+        }
+        start = colon + 1;
+    }
+    cache[key] = found;
+    return found;
+}
+
+int run_process(const ProcessSpec& spec) {
+    const std::string path = find_on_path(spec.program);
+    if (path.empty())
+        return kRunNotStarted;
+
+    FdGuard in_fd(spec.stdin_path.empty() ? -1
+                                          : ::open(spec.stdin_path.c_str(), O_RDONLY | O_CLOEXEC));
+    if (!spec.stdin_path.empty() && in_fd.get() < 0)
+        return kRunStdinFailed;
+
+    int out_flags = O_WRONLY | O_CREAT | O_CLOEXEC;
+    out_flags |= spec.stdout_mode == OutputMode::kAppend ? O_APPEND : O_TRUNC;
+    FdGuard out_fd(spec.stdout_mode == OutputMode::kInherit
+                       ? -1
+                       : ::open(spec.stdout_path.c_str(), out_flags, 0666));
+    if (spec.stdout_mode != OutputMode::kInherit && out_fd.get() < 0)
+        return kRunStdoutFailed;
+
+    std::vector<char*> argv;
+    argv.reserve(spec.args.size() + 2);
+    argv.push_back(const_cast<char*>(spec.program.c_str()));
+    for (const std::string& arg : spec.args)
+        argv.push_back(const_cast<char*>(arg.c_str()));
+    argv.push_back(nullptr);
+
+    posix_spawn_file_actions_t actions;
+    if (posix_spawn_file_actions_init(&actions) != 0)
+        return kRunNotStarted;
+    if (in_fd.get() >= 0)
+        posix_spawn_file_actions_adddup2(&actions, in_fd.get(), STDIN_FILENO);
+    if (out_fd.get() >= 0)
+        posix_spawn_file_actions_adddup2(&actions, out_fd.get(), STDOUT_FILENO);
+
+    std::fflush(stdout);
+    pid_t pid = 0;
+    int rc = posix_spawn(&pid, path.c_str(), &actions, nullptr, argv.data(), environ);
+    posix_spawn_file_actions_destroy(&actions);
+    if (rc != 0)
+        return kRunNotStarted;
+
+    int status = 0;
+    while (::waitpid(pid, &status, 0) < 0) {
+        if (errno != EINTR)
+            return kRunNotStarted;
+    }
+    if (WIFEXITED(status))
+        return WEXITSTATUS(status);
+    if (WIFSIGNALED(status))
+        return 128 + WTERMSIG(status);
+    return kRunNotStarted;
+}
+
+}  // namespace zr7

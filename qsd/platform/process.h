@@ -1,0 +1,42 @@
+// The one way the tool starts another program: an argument vector, never a
+// shell, with the redirections done here rather than by a command line.
+#pragma once
+
+#include <string>
+#include <vector>
+
+namespace zr7 {
+
+enum class OutputMode { kInherit, kTruncate, kAppend };
+
+struct ProcessSpec {
+    // A name without "/" is looked up on PATH; a name with one is used as is.
+    std::string program;
+    // argv[1..]; argv[0] is `program` as given.
+    std::vector<std::string> args;
+    // Standard input from this file when not empty.
+    std::string stdin_path;
+    // Standard output to this file when the mode is not kInherit; a created
+    // file gets mode 0666 less the umask.
+    std::string stdout_path;
+    OutputMode stdout_mode = OutputMode::kInherit;
+};
+
+// Statuses of run_process besides the program's own 0..255 and 128+signal.
+constexpr int kRunNotStarted = -1;    // not found on PATH, or spawn failed
+constexpr int kRunStdinFailed = -2;   // standard input file could not be opened
+constexpr int kRunStdoutFailed = -3;  // standard output file could not be opened
+
+// Starts the program and waits for it. Returns its exit status, 128+N when
+// signal N ended it, or one of the kRun* failures. The standard input file is
+// opened before the output file, so a missing input leaves an existing output
+// untouched. Standard output is flushed first so that the tool's own lines and
+// the child's stay in order.
+int run_process(const ProcessSpec& spec);
+
+// Full path of `program` on PATH ("" when not found). The answer is cached
+// per program name and PATH value: a run starts the same few programs
+// thousands of times.
+std::string find_on_path(const std::string& program);
+
+}  // namespace zr7

@@ -1,0 +1,200 @@
+#include "qsd/platform/trace.h"
+
+#include <unistd.h>
+
+#include <cstdarg>
+#include <cstdio>
+#include <cstdlib>
+#include <ctime>
+#include <string>
+#include <vector>
+
+#include "qsd/text/text.h"
+
+namespace zr7 {
+
+unsigned g_trace_sync = 1;
+
+namespace {
+
+struct TraceSetting {
+    bool loaded = false;
+    std::string text;
+};
+
+TraceSetting& setting() {
+    static TraceSetting instance;
+    return instance;
+}
+
+// Applies one word to a flags word; unknown words change nothing.
+unsigned apply_word(unsigned flags, const std::string& word) {
+    const std::string w = to_upper_c(word);
+    if (w == "ERROR")
+        return flags | TRC1_ERROR;
+    if (w == "DETAIL")
+        return flags | TRC1_DETAIL;
+    if (w == "FLOW")
+        return flags | TRC1_FLOW;
+    if (w == "ALL")
+        return flags | TRC1_ALL;
+    if (w == "NONE")
+        return 0;
+    return flags;
+}
+
+bool has_prefix_nocase(const std::string& name, const std::string& prefix) {
+    return name.size() >= prefix.size() &&
+           to_lower_c(name.substr(0, prefix.size())) == to_lower_c(prefix);
+}
+
+}  // namespace
+
+unsigned trace_flags_for(const std::string& text, const std::string& unit_name) {
+    if (strip(strip(text, '\t'), ' ').empty())
+        return TRC1_ERROR;
+    unsigned flags = 0;
+    std::size_t pos = 0;
+    const std::string blanks = " \t\r\n";
+    while (pos < text.size()) {
+        pos = text.find_first_not_of(blanks, pos);
+        if (pos == std::string::npos)
+            break;
+        if (text[pos] == '(') {
+            // A group: "(UNIT:prefix words)", or up to the end of the text.
+            std::size_t close = text.find(')', pos);
+            std::string group = text.substr(
+                pos + 1, close == std::string::npos ? std::string::npos : close - pos - 1);
+            pos = close == std::string::npos ? text.size() : close + 1;
+            Tokenizer words(group);
+            std::string head = words.next(" \t\r\n");
+            if (to_upper_c(head.substr(0, 5)) != "UNIT:")
+                continue;
+            if (!has_prefix_nocase(unit_name, head.substr(5)))
+                continue;
+            for (std::string w = words.next(" \t\r\n"); !w.empty(); w = words.next(" \t\r\n")) {
+                flags = apply_word(flags, w);
+            }
+            continue;
+        }
+        std::size_t end = text.find_first_of(blanks + "(", pos);
+        if (end == std::string::npos)
+            end = text.size();
+        flags = apply_word(flags, text.substr(pos, end - pos));
+        pos = end;
+    }
+    return flags;
+}
+
+void trace_reconfigure(const std::string& text) {
+    setting().loaded = true;
+    setting().text = text;
+    ++g_trace_sync;
+    if (g_trace_sync == 0)
+        g_trace_sync = 1;
+}
+
+TraceScope::TraceScope(TRC1_Unit& unit, int line, bool flow_events)
+    : unit_(unit), flags_(trace_flags(unit)), flow_(flow_events && (flags_ & TRC1_FLOW) != 0) {
+    if (flow_)
+        TRC1_Event(&unit_, line, TRC1_ENTRY);
+}
+
+TraceScope::~TraceScope() {
+    if (flow_ && !exited_)
+        TRC1_Event(&unit_, unit_.line, TRC1_EXIT);
+}
+
+int TraceScope::exit(int line, int status) {
+    if (flow_ && !exited_)
+        TRC1_Event(&unit_, line, TRC1_EXIT_STATUS, status);
+    exited_ = true;
+    return status;
+}
+
+namespace {
+
+void write_line(const TRC1_Unit* unit, int line, const std::string& message) {
+    char stamp[32] = "";
+    std::time_t now = std::time(nullptr);
+    struct tm parts {};
+    if (localtime_r(&now, &parts) != nullptr) {
+        std::strftime(stamp, sizeof stamp, "%Y-%m-%d %H:%M:%S", &parts);
+    }
+    std::string out = "(";
+    out += stamp;
+    out += " pid ";
+    out += std::to_string(static_cast<long>(getpid()));
+    out += ' ';
+    out += unit->name;
+    out += ':';
+    out += std::to_string(line);
+    out += ") ";
+    out += message;
+    out += '\n';
+    std::fwrite(out.data(), 1, out.size(), stdout);
+    std::fflush(stdout);
+}
+
+}  // namespace
+
+}  // namespace zr7
+
+unsigned TRC1_Sync(TRC1_Unit* unit) {
+    auto& s = zr7::setting();
+    if (!s.loaded) {
+        const char* value = std::getenv("VXA_TRC1");
+        s.text = value == nullptr ? "" : value;
+        s.loaded = true;
+    }
+    unit->flags = zr7::trace_flags_for(s.text, unit->name);
+    unit->sync = zr7::g_trace_sync;
+    return unit->flags;
+}
+
+void TRC1_Event(TRC1_Unit* unit, int line, int kind, int status) {
+    if ((zr7::trace_flags(*unit) & TRC1_FLOW) == 0)
+        return;
+    switch (kind) {
+        case TRC1_ENTRY:
+            zr7::write_line(unit, line, "Entry");
+            break;
+        case TRC1_EXIT_STATUS:
+            zr7::write_line(unit, line, "Exit: " + std::to_string(status));
+            break;
+        default:
+            zr7::write_line(unit, line, "Exit");
+            break;
+    }
+}
+
+void TRC1_Printf(TRC1_Unit* unit, int line, const char* format, ...) {
+    va_list args;
+    va_start(args, format);
+    va_list again;
+    va_copy(again, args);
+    int size = std::vsnprintf(nullptr, 0, format, args);
+    va_end(args);
+    std::string message;
+    if (size > 0) {
+        std::vector<char> buffer(static_cast<std::size_t>(size) + 1);
+        std::vsnprintf(buffer.data(), buffer.size(), format, again);
+        message.assign(buffer.data(), static_cast<std::size_t>(size));
+    }
+    va_end(again);
+    zr7::write_line(unit, line, message);
+}
+
+const char* PLT1_GetEnv(const char* name, const char* /*unused*/) {
+    return name == nullptr ? nullptr : std::getenv(name);
+}
+
+int PLT1_PutEnv(const char* entry) {
+    if (entry == nullptr)
+        return -1;
+    std::string text(entry);
+    std::size_t eq = text.find('=');
+    if (eq == std::string::npos || eq == 0)
+        return -1;
+    return setenv(text.substr(0, eq).c_str(), text.c_str() + eq + 1, 1) == 0 ? 0 : -1;
+}
