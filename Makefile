@@ -3,7 +3,7 @@ BUILD_TEST ?= build/asan
 BUILD_REL ?= build/release
 JOBS ?= $(shell nproc)
 
-.PHONY: all build test format clean
+.PHONY: all build test bench format clean
 
 all: build
 
@@ -18,8 +18,19 @@ test:
 	ASAN_OPTIONS=detect_leaks=1:abort_on_error=0 UBSAN_OPTIONS=print_stacktrace=1:halt_on_error=1 \
 		ctest --test-dir $(BUILD_TEST) --output-on-failure -j $(JOBS)
 
+# The benchmark: the tool against the shell way and a plain copy on three
+# sizes of synthetic installation, and the limits (a very deep tree, a very
+# large directory). Writes bench/RESULTS.md; the full run takes half an hour
+# or so on two cores. BENCH_ARGS passes options to the runner, e.g.
+#   make bench BENCH_ARGS="--sizes small --rounds 3 --no-limits"
+BENCH_ARGS ?=
+bench:
+	cmake -S . -B $(BUILD_REL) -G Ninja -DCMAKE_BUILD_TYPE=RelWithDebInfo
+	cmake --build $(BUILD_REL) -j $(JOBS)
+	$(BUILD_REL)/bin/zr7bench_run $(BENCH_ARGS)
+
 format:
-	find qsd tests -name '*.cpp' -o -name '*.h' | xargs clang-format -i
+	find qsd tests bench -name '*.cpp' -o -name '*.h' | xargs clang-format -i
 
 clean:
 	rm -rf build
