@@ -1,8 +1,10 @@
 // The option letters of a tree-copy command.
 #include <gtest/gtest.h>
+#include <ostream>
 
 #include "qsd/fileops/copy_options.h"
 #include "qsd/fileops/install_util.h"
+#include "support/printable.h"
 
 namespace {
 
@@ -10,6 +12,10 @@ struct OptionCase {
     const char* options;
     unsigned flags;
 };
+
+void PrintTo(const OptionCase& c, std::ostream* os) {
+    *os << "options <" << zr7test::printable(c.options) << ">";
+}
 
 class CopyOptionsTest : public ::testing::TestWithParam<OptionCase> {};
 

@@ -3,9 +3,11 @@
 #include <gtest/gtest.h>
 
 #include <functional>
+#include <ostream>
 
 #include "qsd/installer/installer610.h"
 #include "qsd/platform/trace.h"
+#include "support/printable.h"
 #include "support/stdout_capture.h"
 #include "support/test_support.h"
 
@@ -107,6 +109,10 @@ struct TemplateCase {
     const char* dst;
     const char* line;
 };
+
+void PrintTo(const TemplateCase& c, std::ostream* os) {
+    *os << zr7test::printable(c.line);
+}
 
 class BadTemplateTest : public CopyCommandTest,
                         public ::testing::WithParamInterface<TemplateCase> {};

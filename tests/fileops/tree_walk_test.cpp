@@ -5,6 +5,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <ostream>
 #include <utility>
 #include <vector>
 
@@ -112,6 +113,10 @@ struct FlagCase {
     const char* added;           // a file the destination lacked
 };
 
+void PrintTo(const FlagCase& c, std::ostream* os) {
+    *os << "flags " << c.flags;
+}
+
 class XcopyFlagsTest : public TreeWalkTest, public ::testing::WithParamInterface<FlagCase> {};
 
 TEST_P(XcopyFlagsTest, OverwriteAndCarriageReturnsFollowTheFlags) {
@@ -195,6 +200,10 @@ struct LoopCase {
     const char* link_dir;  // where the link stands, below src ("" for src itself)
     const char* target;    // what it points to; "@" stands for src itself
 };
+
+void PrintTo(const LoopCase& c, std::ostream* os) {
+    *os << "<" << c.link_dir << "/loop> -> <" << c.target << ">";
+}
 
 class DirectoryLoopTest : public TreeWalkTest, public ::testing::WithParamInterface<LoopCase> {};
 

@@ -1,7 +1,10 @@
 // The seed command: every SQL file of a directory, in directory order.
+#include <ostream>
+
 #include "qsd/installer/installer610.h"
 #include "seeding/seeding_fixture.h"
 #include "support/dir_order.h"
+#include "support/printable.h"
 #include "support/stdout_capture.h"
 
 namespace {
@@ -74,6 +77,10 @@ struct TemplateCase {
     const char* dst;
     const char* line;
 };
+
+void PrintTo(const TemplateCase& c, std::ostream* os) {
+    *os << zr7test::printable(c.line);
+}
 
 class SeedTemplateTest : public SeedDriverTest,
                          public ::testing::WithParamInterface<TemplateCase> {};

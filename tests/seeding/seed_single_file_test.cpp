@@ -3,9 +3,11 @@
 #include <unistd.h>
 
 #include <cstdlib>
+#include <ostream>
 
 #include "qsd/fileops/install_util.h"
 #include "seeding/seeding_fixture.h"
+#include "support/printable.h"
 #include "support/stdout_capture.h"
 
 namespace {
@@ -150,6 +152,10 @@ struct PassedOverCase {
     const char* name;
     const char* line;
 };
+
+void PrintTo(const PassedOverCase& c, std::ostream* os) {
+    *os << "name <" << zr7test::printable(c.name) << ">";
+}
 
 class PassedOverTest : public SeedingTest, public ::testing::WithParamInterface<PassedOverCase> {};
 

@@ -1,7 +1,9 @@
 // The texts of one loader run.
 #include <gtest/gtest.h>
+#include <ostream>
 
 #include "qsd/seeding/seed_texts.h"
+#include "support/printable.h"
 
 namespace {
 
@@ -29,6 +31,10 @@ struct CommandCase {
     const char* command;
 };
 
+void PrintTo(const CommandCase& c, std::ostream* os) {
+    *os << zr7test::printable(c.command);
+}
+
 class LoaderCommandTest : public ::testing::TestWithParam<CommandCase> {};
 
 TEST_P(LoaderCommandTest, ReadsAsTheShellWould) {
@@ -49,6 +55,10 @@ struct SqllibCase {
     const char* dir;
     const char* entry;
 };
+
+void PrintTo(const SqllibCase& c, std::ostream* os) {
+    *os << zr7test::printable(c.entry);
+}
 
 class SqllibEntryTest : public ::testing::TestWithParam<SqllibCase> {};
 

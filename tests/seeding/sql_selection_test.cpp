@@ -1,7 +1,9 @@
 // Which listed names seeding hands to the loader.
 #include <gtest/gtest.h>
+#include <ostream>
 
 #include "qsd/seeding/sql_selection.h"
+#include "support/printable.h"
 
 namespace {
 
@@ -11,6 +13,10 @@ struct NameCase {
     const char* name;
     SqlSelection expected;
 };
+
+void PrintTo(const NameCase& c, std::ostream* os) {
+    *os << "name <" << zr7test::printable(c.name) << ">";
+}
 
 class SqlSelectionTest : public ::testing::TestWithParam<NameCase> {};
 
