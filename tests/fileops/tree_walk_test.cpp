@@ -159,6 +159,15 @@ TEST_F(TreeWalkTest, PlainFileWhereASubDirectoryGoesFails) {
     EXPECT_EQ(read_file(dst + "/sub"), "in the way");
 }
 
+TEST_F(TreeWalkTest, DirectoryWhereAFileGoesFailsInsteadOfTakingTheFile) {
+    write_file(src + "/x.dat", "x");
+    make_dirs(dst + "/x.dat");
+    for (unsigned flags : {kCopyOverwrite, kCopyOverwrite | kCopyFixCr}) {
+        EXPECT_EQ(InstallUtil::xcopy(src.c_str(), (dst + "/").c_str(), flags), -5) << flags;
+        EXPECT_EQ(zr7test::list_dir(dst + "/x.dat"), std::vector<std::string>{}) << flags;
+    }
+}
+
 TEST_F(TreeWalkTest, LinksAreFollowedAndDanglingOnesSkipped) {
     make_dirs(src + "/real");
     write_file(src + "/real/in.txt", "inside");
