@@ -78,17 +78,6 @@ TEST_F(CopyCommandTest, FlatCopyIntoAMissingDirectoryFailsAndNamesTheFiles) {
     EXPECT_FALSE(exists(dst + "/NONE"));
 }
 
-TEST_F(CopyCommandTest, TreeCopyAppliesItsOptionLetters) {
-    make_dirs(src + "/t");
-    write_file(src + "/t/x.txt", "new\r\n");
-    make_dirs(dst + "/t");
-    write_file(dst + "/t/x.txt", "old\r\n");
-    EXPECT_EQ(installer.recursive_copy("${SRC}", "${DST}", "T"), 0);
-    EXPECT_EQ(read_file(dst + "/t/x.txt"), "old\r\n");
-    EXPECT_EQ(installer.recursive_copy("${SRC}", "${DST}", "OT"), 0);
-    EXPECT_EQ(read_file(dst + "/t/x.txt"), "new\n");
-}
-
 TEST_F(CopyCommandTest, TreeCopyOfAMissingSourceIsNothingToDo) {
     EXPECT_EQ(run_traced([&] { return installer.recursive_copy("${SRC}/NONE", "${DST}", "O"); }),
               0);

@@ -3,7 +3,6 @@
 
 #include "qsd/installer/installer610.h"
 #include "seeding/seeding_fixture.h"
-#include "support/dir_order.h"
 #include "support/printable.h"
 #include "support/stdout_capture.h"
 
@@ -49,20 +48,6 @@ TEST_F(SeedDriverTest, MissingSourceDirectoryGivesMinus7) {
     EXPECT_EQ(run_traced([&] { return installer.seed("${SRC}/NONE", "${DST}"); }), -7);
     EXPECT_TRUE(zr7test::has_exit_event(out, "Installer610::seed", -7)) << out;
     EXPECT_EQ(out.find("Error:"), std::string::npos) << out;
-}
-
-TEST_F(SeedDriverTest, SecondOfThreeFailingStopsTheSeeding) {
-    for (const char* name : {"one.sql", "two.sql", "three.sql"})
-        add_sql(name);
-    const std::vector<std::string> order = zr7test::readdir_order(source);
-    ASSERT_EQ(order.size(), 3u);
-    ::setenv("QDSLOAD_FAIL", order[1].c_str(), 1);
-    EXPECT_EQ(run_traced([&] { return installer.seed("${SRC}", "${DST}"); }), -6);
-    EXPECT_TRUE(zr7test::has_trace_line(out, "Error: Seeding <" + order[1] + "> failed")) << out;
-    EXPECT_EQ(catalog_count(order[0]), 1);
-    EXPECT_EQ(catalog_count(order[1]), 0);
-    EXPECT_EQ(catalog_count(order[2]), 0);
-    EXPECT_FALSE(zr7test::exists(record + "/" + order[2] + ".rsp"));
 }
 
 TEST_F(SeedDriverTest, ResponseFileFailureStopsTheSeedingWithMinus8) {
