@@ -42,7 +42,9 @@ int InstallUtil::copy_file(const char* src, const char* dst, unsigned flags) {
             ZR7_DETAIL("...issuing cmd <%s>", shown.c_str());
         }
         spec.program = "cp";
-        spec.args = {"-f", "--", src, dst};
+        // -T: a directory standing at the destination is a failure, not a
+        // place to copy into.
+        spec.args = {"-f", "-T", "--", src, dst};
     }
 
     const int status = zr7::run_process(spec) == 0 ? 0 : -5;
