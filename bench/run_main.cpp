@@ -207,11 +207,13 @@ void fresh_home(const Case& c, const HomeOptions& home) {
 }
 
 // The installed trees, without what differs by design: the environment file
-// and its backups, the logs and the seeding logs.
+// and its backups (rewritten by each contestant its own way), the logs, and
+// the stand-in loader's catalog record (it holds the time of each load).
 TreeDigest installed(const Case& c) {
     TreeDigest all;
     for (const std::string& top : {std::string("tables"), c.arch}) {
-        for (const auto& entry : digest_tree(c.home + "/" + top, {"VXAENV", ".archive"}))
+        for (const auto& entry :
+             digest_tree(c.home + "/" + top, {"VXAENV", ".archive", "qdsload.catalog"}))
             all[top + "/" + entry.first] = entry.second;
     }
     return all;
