@@ -70,7 +70,7 @@ int Installer610::update_vxaenv(const std::string& dir_template) {
         ZR7_RETURN(0);
 
     if (module_name.find_first_of("\r\n") != std::string::npos) {
-        ZR7_ERROR("Error: Module name <%s> holds a line break", module_name.c_str());
+        ZR7_ERROR("Error: Module name holds a line break");
         ZR7_RETURN(-1);
     }
     if (const std::string* key = first_with_line_break(settings)) {
