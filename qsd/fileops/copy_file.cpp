@@ -9,6 +9,8 @@
 // ever reaches a shell.
 int InstallUtil::copy_file(const char* src, const char* dst, unsigned flags) {
     ZR7_TRACED("InstallUtil::copy_file");
+    if (src == nullptr || dst == nullptr)
+        return -5;  // nothing names the file: no copy, and no line to trace
     const int overwrite = (flags & kCopyOverwrite) != 0 ? 1 : 0;
     const int fix_cr = (flags & kCopyFixCr) != 0 ? 1 : 0;
     ZR7_DETAIL("Copy begin --------------");
