@@ -36,8 +36,9 @@ constexpr int kRunStdoutFailed = -3;  // output file could not be opened, or is 
 int run_process(const ProcessSpec& spec);
 
 // Full path of `program` on PATH ("" when not found). The answer is cached
-// per program name and PATH value: a run starts the same few programs
-// thousands of times.
+// per program name and PATH value and used without looking at the disk
+// again: a run starts the same few programs thousands of times. When a
+// cached program fails to start, run_process searches PATH once more.
 std::string find_on_path(const std::string& program);
 
 }  // namespace zr7
