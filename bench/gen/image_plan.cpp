@@ -251,13 +251,17 @@ ImagePlan Planner::run() {
     plan_binary_tree(arch_dir_ + "/bin", {"helpers"}, "k%04zuagent", counts[8], 0755);
     if (options_.deep > 0)
         plan_deep();
-    for (std::size_t i = 0; i < options_.wide; ++i) {
-        PlannedFile file;
-        file.path = msrv_ + "ATTRLIB/" + numbered("w%05zu.atr", i);
-        file.size = 100 + i % 200;
-        file.content = i % 2 == 0 ? Content::kTextCrlf : Content::kText;
-        file.content_seed = i;
-        files_.push_back(file);
+    if (options_.wide > 0) {
+        const std::string dir = arch_dir_ + "/TABLE/wide";
+        add_dir(dir);
+        for (std::size_t i = 0; i < options_.wide; ++i) {
+            PlannedFile file;
+            file.path = dir + numbered("/w%05zu.dat", i);
+            file.size = 100 + i % 200;
+            file.content = i % 2 == 0 ? Content::kTextCrlf : Content::kText;
+            file.content_seed = i;
+            files_.push_back(file);
+        }
     }
 
     ImagePlan plan;

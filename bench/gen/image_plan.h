@@ -52,7 +52,7 @@ struct GenOptions {
     std::uint64_t seed = 20261206;
     std::string arch = "lx8266";
     std::size_t deep = 0;  // > 0: a chain of this many directories under TABLE
-    std::size_t wide = 0;  // > 0: this many more files in ATTRLIB alone
+    std::size_t wide = 0;  // > 0: this many more files in one directory under TABLE
 };
 
 // The named sizes of the benchmark: "small", "default", "large". Returns 0

@@ -187,6 +187,7 @@ std::string render_markdown(const Report& report) {
            " (the machine may be shared)\n";
     out += "- Rounds: " + std::to_string(report.rounds) +
            " per contestant and size, the contestants alternating, each on a fresh server home\n";
+    out += "- Work directory: " + report.work_dir + "\n";
     out += "- Command: `" + report.command + "`\n\n";
 
     out += "## Sizes\n\n";

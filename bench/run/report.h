@@ -64,7 +64,8 @@ struct Machine {
 struct Report {
     Machine machine;
     int rounds = 0;
-    std::string command;  // the runner's command line
+    std::string command;   // the runner's command line
+    std::string work_dir;  // where images and homes were written, with its file system
     std::vector<std::string> contestant_commands;
     std::vector<SizeRun> sizes;
     std::vector<RobustRun> robust;
