@@ -256,11 +256,6 @@ TreeDigest installed(const Case& c) {
     return all;
 }
 
-void say(const char* fmt, const std::string& a, double b = 0, double c = 0) {
-    std::fprintf(stderr, fmt, a.c_str(), b, c);
-    std::fflush(stderr);
-}
-
 SizeRun run_size(const Options& o, const Bench& b, const std::string& name) {
     SizeRun run;
     run.name = name;
@@ -279,7 +274,7 @@ SizeRun run_size(const Options& o, const Bench& b, const std::string& name) {
     c.home = o.work + "/" + name + "/home";
     HomeOptions home;
     home.seed = o.seed;
-    say("[%s] writing the image\n", name);
+    std::fprintf(stderr, "[%s] writing the image\n", name.c_str());
     if (remove_tree(c.image) != 0 || write_image(plan, c.image) != 0)
         fail_setup("cannot write the image at " + c.image);
 
@@ -337,7 +332,7 @@ RobustRun run_limit(const Options& o, const Bench& b, const std::string& name) {
     if (remove_tree(c.image) != 0 || write_image(plan, c.image) != 0)
         fail_setup("cannot write the image at " + c.image);
     fresh_home(c, home);
-    say("[%s] installing\n", name);
+    std::fprintf(stderr, "[%s] installing\n", name.c_str());
     run.sample = run_tool(b, c);
     run.exit_code = run.sample.exit_code;
 
