@@ -2,6 +2,7 @@
 // and the argument vector that the second run really receives.
 #include <gtest/gtest.h>
 
+#include <ostream>
 #include <string>
 #include <vector>
 
@@ -31,6 +32,10 @@ struct TextCase {
     std::vector<std::string> args;  // argv[0] first
     std::string text;
 };
+
+void PrintTo(const TextCase& c, std::ostream* os) {
+    *os << c.name;
+}
 
 class RelaunchTextTest : public ::testing::TestWithParam<TextCase> {};
 

@@ -2,6 +2,7 @@
 // they fit a terminal, and that no file name can steer the terminal.
 #include <gtest/gtest.h>
 
+#include <ostream>
 #include <string>
 
 #include "qsd/platform/progress.h"
@@ -29,6 +30,10 @@ zr7::ProgressState with_counts(zr7::ProgressState state, long copied, long seede
     state.files_seeded = seeded;
     state.seeding = seeding;
     return state;
+}
+
+void PrintTo(const LineCase& c, std::ostream* os) {
+    *os << c.name;
 }
 
 class ProgressLineTest : public ::testing::TestWithParam<LineCase> {};
@@ -84,6 +89,10 @@ struct SafeCase {
     std::string in;
     std::string out;
 };
+
+void PrintTo(const SafeCase& c, std::ostream* os) {
+    *os << c.name;
+}
 
 class TerminalSafeTest : public ::testing::TestWithParam<SafeCase> {};
 
