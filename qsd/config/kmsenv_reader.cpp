@@ -48,7 +48,9 @@ KmsenvResult read_kmsenv(const std::string& content, const ServerConfig& start) 
         }
         Tokenizer fields(line);
         const std::string owner = fields.next(separators);
-        if (owner == "default")
+        // A line of separators alone holds no field at all: like an empty
+        // line it neither names the server nor ends the reading.
+        if (owner.empty() || owner == "default")
             continue;
         if (c.server_name.empty()) {
             c.server_name = owner;

@@ -25,11 +25,12 @@ struct KmsenvResult {
 };
 
 // Reads the whole file content. Lines are taken whole and without their
-// "\n" or "\r\n"; empty lines are skipped. Until a "FIELDSEP=..." line the
-// lines are headings; after it every line is a record "owner|key|value"
-// split at any byte of the separator set. "default" records are skipped, the
-// first other owner names the server (unless one is named already), and the
-// first record of another server ends the reading.
+// "\n" or "\r\n"; empty lines, and lines of separators alone, are skipped.
+// Until a "FIELDSEP=..." line the lines are headings; after it every line is
+// a record "owner|key|value" split at any byte of the separator set.
+// "default" records are skipped, the first other owner names the server
+// (unless one is named already), and the first record of another server ends
+// the reading.
 KmsenvResult read_kmsenv(const std::string& content, const ServerConfig& start);
 
 // "KDC_FAMILIES=PORT:" port " " protocol " USE:Y".

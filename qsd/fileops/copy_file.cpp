@@ -9,6 +9,8 @@
 // ever reaches a shell.
 int InstallUtil::copy_file(const char* src, const char* dst, unsigned flags) {
     ZR7_TRACED("InstallUtil::copy_file");
+    if (src == nullptr || dst == nullptr)
+        return -5;  // nothing names the file: no copy, and no line to trace
     const int overwrite = (flags & kCopyOverwrite) != 0 ? 1 : 0;
     const int fix_cr = (flags & kCopyFixCr) != 0 ? 1 : 0;
     ZR7_DETAIL("Copy begin --------------");
@@ -40,7 +42,9 @@ int InstallUtil::copy_file(const char* src, const char* dst, unsigned flags) {
             ZR7_DETAIL("...issuing cmd <%s>", shown.c_str());
         }
         spec.program = "cp";
-        spec.args = {"-f", "--", src, dst};
+        // -T: a directory standing at the destination is a failure, not a
+        // place to copy into.
+        spec.args = {"-f", "-T", "--", src, dst};
     }
 
     const int status = zr7::run_process(spec) == 0 ? 0 : -5;

@@ -9,6 +9,8 @@
 
 int InstallUtil::delete_file(const char* path) {
     ZR7_TRACED("InstallUtil::delete_file");
+    if (path == nullptr)
+        return -1;
     ZR7_DETAIL("deleting <%s>", path);
     return ::unlink(path) == 0 ? 0 : -1;
 }

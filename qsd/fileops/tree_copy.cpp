@@ -1,30 +1,75 @@
-// Placeholder until the flat and tree copies are built: every operation fails
-// loudly rather than pretending to have copied anything.
+// The flat and tree copies of the install commands.
+#include <sys/stat.h>
+
+#include "qsd/fileops/copy_options.h"
 #include "qsd/fileops/install_util.h"
 #include "qsd/installer/installer610.h"
+#include "qsd/platform/progress.h"
 #include "qsd/platform/trace.h"
 
-int InstallUtil::get_file_list(const char*, zr7::StringList&) {
-    return -7;
-}
-int InstallUtil::recursive_process(const char*, const char*, EntryOperation, unsigned) {
-    return -7;
-}
-int InstallUtil::copy(const char*, const char*, unsigned) {
-    return -5;
-}
-int InstallUtil::xcopy(const char*, const char*, unsigned) {
-    return -5;
-}
-
-int Installer610::copy(const std::string&, const std::string&) {
+int Installer610::copy(const std::string& src_template, const std::string& dst_template) {
     ZR7_OPERATION("Installer610::copy");
-    ZR7_ERROR("Error: copying is not available in this build");
-    ZR7_RETURN(-5);
+    std::string src;
+    if (src_template.empty() || resolve(src_template, src) < 0) {
+        ZR7_ERROR("Error: Bad src path <%s>", src_template.c_str());
+        ZR7_RETURN(-1);
+    }
+    std::string dst;
+    if (dst_template.empty() || resolve(dst_template, dst) < 0) {
+        ZR7_ERROR("Error: Bad dst path <%s>", dst_template.c_str());
+        ZR7_RETURN(-1);
+    }
+    ZR7_DETAIL("expanded src path <%s>", src.c_str());
+    ZR7_DETAIL("expanded dst path <%s>", dst.c_str());
+
+    // A source directory the image does not have is nothing to do.
+    zr7::StringList names;
+    if (InstallUtil::get_file_list(src.c_str(), names) == -7) {
+        ZR7_DETAIL("No file to process in <%s>", src.c_str());
+        ZR7_RETURN(0);
+    }
+
+    // Only the files directly in the source; the destination must exist.
+    int status = 0;
+    for (const std::string& name : names) {
+        ZR7_DETAIL("processing <%s>", name.c_str());
+        const std::string from = src + "/" + name;
+        const std::string to = dst + "/" + name;
+        status = InstallUtil::copy_file(from.c_str(), to.c_str(), kCopyOverwrite | kCopyFixCr);
+        if (status != 0) {
+            ZR7_ERROR("Error: Copy src <%s> to dst <%s> failed", from.c_str(), to.c_str());
+            break;
+        }
+        zr7::progress_file_copied(to);
+    }
+    ZR7_RETURN(status);
 }
 
-int Installer610::recursive_copy(const std::string&, const std::string&, const std::string&) {
+int Installer610::recursive_copy(const std::string& src_template, const std::string& dst_template,
+                                 const std::string& options) {
     ZR7_OPERATION("Installer610::recursive_copy");
-    ZR7_ERROR("Error: copying is not available in this build");
-    ZR7_RETURN(-5);
+    std::string src;
+    if (src_template.empty() || resolve(src_template, src) < 0) {
+        ZR7_ERROR("Error: Bad src path <%s>", src_template.c_str());
+        ZR7_RETURN(-1);
+    }
+    std::string dst;
+    if (dst_template.empty() || resolve(dst_template, dst) < 0) {
+        ZR7_ERROR("Error: Bad dst path <%s>", dst_template.c_str());
+        ZR7_RETURN(-1);
+    }
+    ZR7_DETAIL("expanded src path <%s>", src.c_str());
+    ZR7_DETAIL("expanded dst path <%s>", dst.c_str());
+
+    struct stat st {};
+    if (::stat(src.c_str(), &st) != 0) {
+        ZR7_DETAIL("src <%s> does not exist.  no work to do.", src.c_str());
+        ZR7_RETURN(0);
+    }
+
+    // The top destination is not created here: it must exist. The walk
+    // creates the sub-directories below it.
+    const unsigned flags = zr7::copy_flags_from_options(options);
+    dst += "/";
+    ZR7_RETURN(InstallUtil::xcopy(src.c_str(), dst.c_str(), flags));
 }

@@ -81,18 +81,36 @@ int run_process(const ProcessSpec& spec) {
     if (path.empty())
         return kRunNotStarted;
 
+    // The input is opened, and checked to be readable data, before the output
+    // is touched: a directory opens for reading but yields nothing, and would
+    // otherwise cost an existing output its content.
     FdGuard in_fd(spec.stdin_path.empty() ? -1
                                           : ::open(spec.stdin_path.c_str(), O_RDONLY | O_CLOEXEC));
-    if (!spec.stdin_path.empty() && in_fd.get() < 0)
+    struct stat in_st {};
+    if (!spec.stdin_path.empty() &&
+        (in_fd.get() < 0 || ::fstat(in_fd.get(), &in_st) != 0 || S_ISDIR(in_st.st_mode))) {
         return kRunStdinFailed;
+    }
 
+    // The output is truncated only once it is known not to be the input file
+    // itself, which truncation would destroy before the program read it.
     int out_flags = O_WRONLY | O_CREAT | O_CLOEXEC;
-    out_flags |= spec.stdout_mode == OutputMode::kAppend ? O_APPEND : O_TRUNC;
+    if (spec.stdout_mode == OutputMode::kAppend)
+        out_flags |= O_APPEND;
     FdGuard out_fd(spec.stdout_mode == OutputMode::kInherit
                        ? -1
                        : ::open(spec.stdout_path.c_str(), out_flags, 0666));
-    if (spec.stdout_mode != OutputMode::kInherit && out_fd.get() < 0)
-        return kRunStdoutFailed;
+    if (spec.stdout_mode != OutputMode::kInherit) {
+        struct stat out_st {};
+        if (out_fd.get() < 0 || ::fstat(out_fd.get(), &out_st) != 0)
+            return kRunStdoutFailed;
+        if (in_fd.get() >= 0 && in_st.st_dev == out_st.st_dev && in_st.st_ino == out_st.st_ino)
+            return kRunStdoutFailed;
+        if (spec.stdout_mode == OutputMode::kTruncate && S_ISREG(out_st.st_mode) &&
+            ::ftruncate(out_fd.get(), 0) != 0) {
+            return kRunStdoutFailed;
+        }
+    }
 
     std::vector<char*> argv;
     argv.reserve(spec.args.size() + 2);

@@ -24,14 +24,15 @@ struct ProcessSpec {
 
 // Statuses of run_process besides the program's own 0..255 and 128+signal.
 constexpr int kRunNotStarted = -1;    // not found on PATH, or spawn failed
-constexpr int kRunStdinFailed = -2;   // standard input file could not be opened
-constexpr int kRunStdoutFailed = -3;  // standard output file could not be opened
+constexpr int kRunStdinFailed = -2;   // input file missing, unreadable or a directory
+constexpr int kRunStdoutFailed = -3;  // output file could not be opened, or is the input
 
 // Starts the program and waits for it. Returns its exit status, 128+N when
 // signal N ended it, or one of the kRun* failures. The standard input file is
 // opened before the output file, so a missing input leaves an existing output
-// untouched. Standard output is flushed first so that the tool's own lines and
-// the child's stay in order.
+// untouched, and an output that is the input file itself is refused before it
+// is truncated. Standard output is flushed first so that the tool's own lines
+// and the child's stay in order.
 int run_process(const ProcessSpec& spec);
 
 // Full path of `program` on PATH ("" when not found). The answer is cached

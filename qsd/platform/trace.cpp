@@ -51,11 +51,12 @@ bool has_prefix_nocase(const std::string& name, const std::string& prefix) {
 }  // namespace
 
 unsigned trace_flags_for(const std::string& text, const std::string& unit_name) {
-    if (strip(strip(text, '\t'), ' ').empty())
+    const std::string blanks = " \t\r\n";
+    // A setting of white space alone counts as an empty one.
+    if (text.find_first_not_of(blanks) == std::string::npos)
         return TRC1_ERROR;
     unsigned flags = 0;
     std::size_t pos = 0;
-    const std::string blanks = " \t\r\n";
     while (pos < text.size()) {
         pos = text.find_first_not_of(blanks, pos);
         if (pos == std::string::npos)

@@ -1,13 +1,37 @@
-// Placeholder until catalog seeding is built.
+// The seed command: every SQL file of the source directory, in the order the
+// directory lists them, through the loader.
+#include "qsd/fileops/install_util.h"
 #include "qsd/installer/installer610.h"
 #include "qsd/platform/trace.h"
 
-int Installer610::seed(const std::string&, const std::string&) {
+int Installer610::seed(const std::string& src_template, const std::string& dst_template) {
     ZR7_OPERATION("Installer610::seed");
-    ZR7_ERROR("Error: seeding is not available in this build");
-    ZR7_RETURN(-6);
-}
+    std::string src;
+    if (src_template.empty() || resolve(src_template, src) < 0) {
+        ZR7_ERROR("Error: Bad src path <%s>", src_template.c_str());
+        ZR7_RETURN(-1);
+    }
+    std::string dst;
+    if (dst_template.empty() || resolve(dst_template, dst) < 0) {
+        ZR7_ERROR("Error: Bad dst path <%s>", dst_template.c_str());
+        ZR7_RETURN(-1);
+    }
+    ZR7_DETAIL("expanded src path <%s>", src.c_str());
+    ZR7_DETAIL("expanded dst path <%s>", dst.c_str());
 
-int Installer610::seed_single_file(const std::string&, const std::string&) {
-    return -6;
+    // The source directory only supplies the names; the loader reads the
+    // files from the destination, where the copy group put them. Unlike the
+    // copies, a missing source directory is a failure here (-7).
+    zr7::StringList names;
+    int status = InstallUtil::get_file_list(src.c_str(), names);
+    if (status == 0) {
+        for (const std::string& name : names) {
+            status = seed_single_file(dst, name);
+            if (status < 0) {
+                ZR7_ERROR("Error: Seeding <%s> failed", name.c_str());
+                break;
+            }
+        }
+    }
+    ZR7_RETURN(status);
 }
