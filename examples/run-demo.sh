@@ -70,10 +70,13 @@ echo "  tables/$server/kzr_site.cfg: $(tail -n 1 "$tables/kzr_site.cfg")"
 echo "installed files that still hold carriage returns (trees copied without T):"
 (cd "$home" && grep -rl $'\r' --exclude-dir=logs --exclude-dir=.archive . | sort | sed 's/^/  /') || true
 
-heading "what the loader recorded (the seeding logs in logs/)"
+heading "what the loader recorded"
+catalog=$home/tables/cicatrsq/qdsload.catalog
+echo "--- tables/cicatrsq/qdsload.catalog (the stand-in loader's catalog)"
+if [ -f "$catalog" ]; then cat "$catalog"; else echo "nothing loaded"; fi
 for log in "$home"/logs/*.sql.log; do
     [ -e "$log" ] || { echo "no seeding log"; break; }
-    echo "--- ${log#"$home"/}"
+    echo "--- ${log#"$home"/} (the loader's output)"
     cat "$log"
 done
 

@@ -157,8 +157,8 @@ std::size_t display_width(const std::string& text) {
 }
 
 std::string progress_line(const ProgressState& state, std::size_t width) {
-    std::string line = position(state) + " " + command_text(state) + " | " +
-                       std::to_string(state.files_copied) + " files copied, " +
+    std::string line = position(state) + " " + command_text(state) +
+                       " | files: " + std::to_string(state.files_copied) + " copied, " +
                        std::to_string(state.files_seeded) + " seeded";
     if (!state.seeding.empty())
         line += " | seeding " + state.seeding;

@@ -149,7 +149,7 @@ TEST(ProgressOnATerminal, ShowsTheLineAndTheSummary) {
     const TerminalRun r = run_on_terminal(install_args(sample));
     EXPECT_EQ(r.exit_code, 0) << r.terminal;
     const std::string& t = r.terminal;
-    EXPECT_EQ(t.find("\r[1/17] copy ATTRLIB | 0 files copied, 0 seeded"), 0u) << t;
+    EXPECT_EQ(t.find("\r[1/17] copy ATTRLIB | files: 0 copied, 0 seeded"), 0u) << t;
     EXPECT_NE(t.find("\r[8/17] copy tree TABLE | "), std::string::npos) << t;
     EXPECT_NE(t.find("\r[14/17] update VXAENV | "), std::string::npos) << t;
     EXPECT_NE(t.find("\r[17/17] seed SQLLIB | "), std::string::npos) << t;

@@ -46,20 +46,20 @@ INSTANTIATE_TEST_SUITE_P(
     Commands, ProgressLineTest,
     ::testing::Values(
         LineCase{"FlatCopy", with_counts(at_command(1, 1, "${SRCPATH}/ATTRLIB"), 0, 0),
-                 "[1/17] copy ATTRLIB | 0 files copied, 0 seeded"},
+                 "[1/17] copy ATTRLIB | files: 0 copied, 0 seeded"},
         LineCase{"TreeCopy", with_counts(at_command(8, 2, "${SRCPATH}/${BINARCH}/TABLE"), 23, 0),
-                 "[8/17] copy tree TABLE | 23 files copied, 0 seeded"},
+                 "[8/17] copy tree TABLE | files: 23 copied, 0 seeded"},
         LineCase{"FlatCopyOutOfATree",
                  with_counts(at_command(15, 1, "${SRCPATH}/${BINARCH}/TABLE/TECLIB"), 31, 0),
-                 "[15/17] copy TABLE/TECLIB | 31 files copied, 0 seeded"},
+                 "[15/17] copy TABLE/TECLIB | files: 31 copied, 0 seeded"},
         LineCase{"EnvironmentFile",
                  with_counts(at_command(14, 3, "${HOMEPATH}/tables/${QMSNAME}"), 30, 0),
-                 "[14/17] update VXAENV | 30 files copied, 0 seeded"},
+                 "[14/17] update VXAENV | files: 30 copied, 0 seeded"},
         LineCase{"Seeding", with_counts(at_command(17, 4, "${SRCPATH}/SQLLIB"), 40, 1, "kzr_b.sql"),
-                 "[17/17] seed SQLLIB | 40 files copied, 1 seeded | seeding kzr_b.sql"},
+                 "[17/17] seed SQLLIB | files: 40 copied, 1 seeded | seeding kzr_b.sql"},
         LineCase{"ControlBytesInAName",
                  with_counts(at_command(17, 4, "${SRCPATH}/SQLLIB"), 0, 0, "a\033]0;pwn\007.sql"),
-                 "[17/17] seed SQLLIB | 0 files copied, 0 seeded | seeding a?]0;pwn?.sql"}),
+                 "[17/17] seed SQLLIB | files: 0 copied, 0 seeded | seeding a?]0;pwn?.sql"}),
     [](const ::testing::TestParamInfo<LineCase>& param_info) {
         return std::string(param_info.param.name);
     });
@@ -68,7 +68,7 @@ TEST(ProgressLine, NeverReachesTheLastColumn) {
     const zr7::ProgressState state =
         with_counts(at_command(17, 4, "${SRCPATH}/SQLLIB"), 40, 1, "a_rather_long_file_name.sql");
     const std::string line = zr7::progress_line(state, 30);
-    EXPECT_EQ(line, "[17/17] seed SQLLIB | 40 f...");
+    EXPECT_EQ(line, "[17/17] seed SQLLIB | file...");
     EXPECT_EQ(zr7::display_width(line), 29u);
     EXPECT_EQ(zr7::progress_line(state, 3), "[1");
     EXPECT_EQ(zr7::progress_line(state, 0), "");
@@ -79,9 +79,9 @@ TEST(ProgressLine, CutsBetweenCharactersNotInsideOne) {
     const zr7::ProgressState state = with_counts(at_command(17, 4, "${SRCPATH}/SQLLIB"), 0, 0,
                                                  "\xc3\xa9\xc3\xa9\xc3\xa9\xc3\xa9.sql");
     const std::string full = zr7::progress_line(state, 200);
-    ASSERT_EQ(full, "[17/17] seed SQLLIB | 0 files copied, 0 seeded | seeding éééé.sql");
+    ASSERT_EQ(full, "[17/17] seed SQLLIB | files: 0 copied, 0 seeded | seeding éééé.sql");
     const std::string cut = zr7::progress_line(state, zr7::display_width(full) - 2);
-    EXPECT_EQ(cut, "[17/17] seed SQLLIB | 0 files copied, 0 seeded | seeding éé...");
+    EXPECT_EQ(cut, "[17/17] seed SQLLIB | files: 0 copied, 0 seeded | seeding éé...");
 }
 
 struct SafeCase {
