@@ -19,11 +19,15 @@ int InstallUtil::copy_file(const char* src, const char* dst, unsigned flags) {
     ZR7_DETAIL("...overwrite <%d> fix cr <%d>", overwrite, fix_cr);
 
     struct stat st {};
-    if (overwrite == 0 && ::stat(dst, &st) == 0) {
+    const bool dst_exists = ::stat(dst, &st) == 0;
+    if (overwrite == 0 && dst_exists) {
         ZR7_DETAIL("...file already exists");
         ZR7_DETAIL("Copy end ----------------");
         return 0;
     }
+    // A directory standing where the file goes is a failure: `cp` would put
+    // the file inside it and report success.
+    const bool dst_is_dir = dst_exists && S_ISDIR(st.st_mode);
 
     zr7::ProcessSpec spec;
     if (fix_cr != 0) {
@@ -42,12 +46,10 @@ int InstallUtil::copy_file(const char* src, const char* dst, unsigned flags) {
             ZR7_DETAIL("...issuing cmd <%s>", shown.c_str());
         }
         spec.program = "cp";
-        // -T: a directory standing at the destination is a failure, not a
-        // place to copy into.
-        spec.args = {"-f", "-T", "--", src, dst};
+        spec.args = {"-f", "--", src, dst};
     }
 
-    const int status = zr7::run_process(spec) == 0 ? 0 : -5;
+    const int status = !dst_is_dir && zr7::run_process(spec) == 0 ? 0 : -5;
     if (status == 0)
         removeReadOnly(dst);
     ZR7_DETAIL("...rc = <%d>", status);
