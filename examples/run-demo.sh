@@ -46,8 +46,10 @@ set -e
 
 heading "exit status: $status"
 
-heading "log $home/logs/qsdinst.log (entry and exit events left out)"
-grep -v -E '\) (Entry|Exit(: -?[0-9]+)?)$' "$home/logs/qsdinst.log" || true
+log=$home/logs/qsdinst.log
+heading "log $log"
+echo "($(wc -l <"$log") lines; shown without entry and exit events and per-file copy details)"
+grep -v -E '\) (Entry|Exit(: -?[0-9]+)?)$|zr7\.InstallUtil::copy_file:' "$log" || true
 
 heading "VXAENV: what changed (diff of the backup against the new file)"
 backup=
@@ -63,7 +65,8 @@ fi
 
 heading "files installed"
 (cd "$home" && find . -type f | sort) >"$scratch/files-after"
-comm -13 "$scratch/files-before" "$scratch/files-after" | grep -v -E '^\./logs/|/\.archive/' || true
+comm -13 "$scratch/files-before" "$scratch/files-after" |
+    grep -v -E '^\./logs/|/\.archive/|/qdsload\.catalog$' || true
 echo
 echo "kept as they were (TABLE_PRESERVE does not replace):"
 echo "  tables/$server/kzr_site.cfg: $(tail -n 1 "$tables/kzr_site.cfg")"

@@ -122,8 +122,11 @@ TerminalRun run_on_terminal(const std::vector<std::string>& args) {
 }
 
 // Two runs in different scratch directories at different times, made
-// comparable: the scratch root becomes "<root>" and every number "#".
-std::string comparable(const std::string& text, const std::string& root) {
+// comparable: the scratch root becomes "<root>", the random suffix of the
+// backup's scratch file "*", and every number "#".
+std::string comparable(const std::string& raw, const std::string& root) {
+    const std::string text =
+        std::regex_replace(raw, std::regex("\\.backup\\.[A-Za-z0-9]+"), ".backup.*");
     std::string out;
     for (std::size_t at = 0; at < text.size();) {
         if (text.compare(at, root.size(), root) == 0) {
