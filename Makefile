@@ -3,12 +3,13 @@ BUILD_TEST ?= build/asan
 BUILD_REL ?= build/release
 JOBS ?= $(shell nproc)
 
-.PHONY: all build test bench format clean
+.PHONY: all build test demo bench format clean
 
 all: build
 
+# The tool and the stand-in loader, optimised; the tests build under `test`.
 build:
-	cmake -S . -B $(BUILD_REL) -G Ninja -DCMAKE_BUILD_TYPE=RelWithDebInfo
+	cmake -S . -B $(BUILD_REL) -G Ninja -DCMAKE_BUILD_TYPE=RelWithDebInfo -DZR7_TESTS=OFF
 	cmake --build $(BUILD_REL) -j $(JOBS)
 
 # The whole suite, built with AddressSanitizer and UndefinedBehaviorSanitizer.
@@ -17,6 +18,11 @@ test:
 	cmake --build $(BUILD_TEST) -j $(JOBS)
 	ASAN_OPTIONS=detect_leaks=1:abort_on_error=0 UBSAN_OPTIONS=print_stacktrace=1:halt_on_error=1 \
 		ctest --test-dir $(BUILD_TEST) --output-on-failure -j $(JOBS)
+
+# A real installation of the sample under examples/ into a scratch copy in
+# $(BUILD_REL)/demo, then what it did.
+demo: build
+	examples/run-demo.sh $(BUILD_REL)
 
 # The benchmark: the tool against the shell way and a plain copy on three
 # sizes of synthetic installation, and the limits (a very deep tree, a very

@@ -144,7 +144,7 @@ RunResult run(const std::string& program, const std::vector<std::string>& args,
         envp.push_back(e.data());
     envp.push_back(nullptr);
 
-    std::vector<std::string> argv_text{program};
+    std::vector<std::string> argv_text{options.argv0.empty() ? program : options.argv0};
     argv_text.insert(argv_text.end(), args.begin(), args.end());
     std::vector<char*> argv;
     for (auto& a : argv_text)
