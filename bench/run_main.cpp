@@ -256,8 +256,18 @@ TreeDigest installed(const Case& c) {
     return all;
 }
 
-SizeRun run_size(const Options& o, const Bench& b, const std::string& name) {
+// One size of the run: its image, its server home, and what was measured.
+struct SizeCase {
     SizeRun run;
+    Case c;
+    HomeOptions home;
+    TreeDigest tool_digest;
+    TreeDigest shell_digest;
+};
+
+SizeCase prepare_size(const Options& o, const std::string& name) {
+    SizeCase sc;
+    SizeRun& run = sc.run;
     run.name = name;
     GenOptions gen;
     gen.files = files_for_size(name);
@@ -268,43 +278,62 @@ SizeRun run_size(const Options& o, const Bench& b, const std::string& name) {
         run.image_bytes += f.size;
     run.work = count_work(plan, gen.arch);
 
-    Case c;
-    c.label = name;
-    c.image = o.work + "/" + name + "/image";
-    c.home = o.work + "/" + name + "/home";
-    HomeOptions home;
-    home.seed = o.seed;
+    sc.c.label = name;
+    sc.c.image = o.work + "/" + name + "/image";
+    sc.c.home = o.work + "/" + name + "/home";
+    sc.home.seed = o.seed;
     std::fprintf(stderr, "[%s] writing the image\n", name.c_str());
-    if (remove_tree(c.image) != 0 || write_image(plan, c.image) != 0)
-        fail_setup("cannot write the image at " + c.image);
+    if (remove_tree(sc.c.image) != 0 || write_image(plan, sc.c.image) != 0)
+        fail_setup("cannot write the image at " + sc.c.image);
+    return sc;
+}
 
-    TreeDigest tool_digest;
-    TreeDigest shell_digest;
+// One round of one size: the three contestants, each on a fresh home, in an
+// order that turns with the round.
+void run_round(const Options& o, const Bench& b, int round, SizeCase& sc) {
+    SizeRun& run = sc.run;
     ContestantRun* order[] = {&run.a, &run.b, &run.c};
-    for (int round = 0; round < o.rounds; ++round) {
-        for (int k = 0; k < 3; ++k) {
-            ContestantRun* who = order[(round + k) % 3];
-            fresh_home(c, home);
-            const Sample s = who->id == 'A'   ? run_tool(b, c)
-                             : who->id == 'B' ? run_shell_way(b, c)
-                                              : run_floor(b, c);
-            who->samples.push_back(s);
-            std::fprintf(stderr, "[%s] round %d/%d: %c %.2f s (exit %d)\n", name.c_str(), round + 1,
-                         o.rounds, who->id, s.wall_s, s.exit_code);
-            if (round == 0 && who->id == 'A')
-                tool_digest = installed(c);
-            if (round == 0 && who->id == 'B')
-                shell_digest = installed(c);
-        }
-        if (round == 0 && run.a.all_succeeded() && run.b.all_succeeded()) {
-            const TreeDifference diff = compare_digests(tool_digest, shell_digest);
-            run.differences = diff.count;
-            run.first_difference = diff.first;
-        }
+    for (int k = 0; k < 3; ++k) {
+        ContestantRun* who = order[(round + k) % 3];
+        fresh_home(sc.c, sc.home);
+        const Sample s = who->id == 'A'   ? run_tool(b, sc.c)
+                         : who->id == 'B' ? run_shell_way(b, sc.c)
+                                          : run_floor(b, sc.c);
+        who->samples.push_back(s);
+        std::fprintf(stderr, "[%s] round %d/%d: %c %.2f s (exit %d)\n", run.name.c_str(), round + 1,
+                     o.rounds, who->id, s.wall_s, s.exit_code);
+        if (round == 0 && who->id == 'A')
+            sc.tool_digest = installed(sc.c);
+        if (round == 0 && who->id == 'B')
+            sc.shell_digest = installed(sc.c);
     }
-    if (!o.keep)
-        remove_tree(o.work + "/" + name);
-    return run;
+    if (round == 0 && run.a.all_succeeded() && run.b.all_succeeded()) {
+        const TreeDifference diff = compare_digests(sc.tool_digest, sc.shell_digest);
+        run.differences = diff.count;
+        run.first_difference = diff.first;
+        sc.tool_digest.clear();
+        sc.shell_digest.clear();
+    }
+}
+
+// Every round runs every size, so that a change in the machine's load in the
+// course of the run touches all sizes alike and the ratio between sizes stays
+// meaningful.
+std::vector<SizeRun> run_sizes(const Options& o, const Bench& b) {
+    std::vector<SizeCase> cases;
+    for (const std::string& size : o.sizes)
+        cases.push_back(prepare_size(o, size));
+    for (int round = 0; round < o.rounds; ++round) {
+        for (std::size_t k = 0; k < cases.size(); ++k)
+            run_round(o, b, round, cases[(static_cast<std::size_t>(round) + k) % cases.size()]);
+    }
+    std::vector<SizeRun> runs;
+    for (SizeCase& sc : cases) {
+        runs.push_back(sc.run);
+        if (!o.keep)
+            remove_tree(o.work + "/" + sc.run.name);
+    }
+    return runs;
 }
 
 // Runs the tool once on an image with nothing but a very deep tree or a very
@@ -406,8 +435,7 @@ int run(int argc, char** argv) {
     check_setup(b);
     report.work_dir = o.work + " (" + describe_file_system(o.work) + ")";
 
-    for (const std::string& size : o.sizes)
-        report.sizes.push_back(run_size(o, b, size));
+    report.sizes = run_sizes(o, b);
     if (o.limits) {
         report.robust.push_back(run_limit(o, b, "deep"));
         report.robust.push_back(run_limit(o, b, "wide"));

@@ -186,7 +186,8 @@ std::string render_markdown(const Report& report) {
            ", at the end " + format("%.2f %.2f %.2f", m.load_end[0], m.load_end[1], m.load_end[2]) +
            " (the machine may be shared)\n";
     out += "- Rounds: " + std::to_string(report.rounds) +
-           " per contestant and size, the contestants alternating, each on a fresh server home\n";
+           " per contestant and size; each round runs every size, the contestants in turns, each "
+           "on a fresh server home\n";
     out += "- Work directory: " + report.work_dir + "\n";
     out += "- Command: `" + report.command + "`\n\n";
 
