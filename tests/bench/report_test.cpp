@@ -95,6 +95,11 @@ TEST(RenderMarkdown, ShowsFiguresFailuresAndTargets) {
                         "of 40000 files installed | NO |"),
               std::string::npos);
     EXPECT_NE(page.find("2 cores"), std::string::npos);
+    // The linear-cost line sets the wall ratio beside the CPU and shell-way
+    // ratios; the shell way failed on large, so its ratio is 0.
+    EXPECT_NE(page.find("| 4.00 (CPU 4.00, shell way 0.00; the copies grow 4.00 times) | yes |"),
+              std::string::npos)
+        << page;
 }
 
 }  // namespace
