@@ -6,13 +6,22 @@
 #include <unistd.h>
 
 #include <regex>
+#include <sstream>
 #include <string>
+#include <vector>
 
 #include "qsd/platform/trace.h"
 #include "support/test_support.h"
-#include "support/trace_lines.h"
 
 namespace {
+
+std::vector<std::string> lines_of(const std::string& text) {
+    std::vector<std::string> lines;
+    std::istringstream in(text);
+    for (std::string line; std::getline(in, line);)
+        lines.push_back(line);
+    return lines;
+}
 
 void detail_line(const char* text) {
     ZR7_TRACED("TraceCache::op");
@@ -27,8 +36,7 @@ TEST(TraceLineCacheTest, EveryLineWholeWithItsOwnMessage) {
     detail_line(long_text.c_str());
     detail_line("");
     detail_line("last");
-    const std::vector<std::string> lines =
-        zr7test::lines_of(testing::internal::GetCapturedStdout());
+    const std::vector<std::string> lines = lines_of(testing::internal::GetCapturedStdout());
     ASSERT_EQ(lines.size(), 4u);
     const std::regex shape(
         R"(\(\d{4}-\d\d-\d\d \d\d:\d\d:\d\d pid (\d+) zr7\.TraceCache::op:\d+\) (.*))");
@@ -54,8 +62,7 @@ TEST(TraceLineCacheTest, ForkedChildNamesItsOwnProcess) {
     }
     int status = 0;
     ::waitpid(child, &status, 0);
-    const std::vector<std::string> lines =
-        zr7test::lines_of(testing::internal::GetCapturedStdout());
+    const std::vector<std::string> lines = lines_of(testing::internal::GetCapturedStdout());
     ASSERT_EQ(lines.size(), 2u);
     EXPECT_NE(lines[0].find(" pid " + std::to_string(::getpid()) + " "), std::string::npos);
     EXPECT_NE(lines[1].find(" pid " + std::to_string(child) + " "), std::string::npos) << lines[1];
