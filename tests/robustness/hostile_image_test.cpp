@@ -1,0 +1,386 @@
+// Source images from elsewhere: names made of any byte, names a shell would
+// act on, deep and wide trees, links of every kind, the wrong kind of file in
+// the wrong place, unreadable entries. Every name lands as it is, nothing
+// runs, and every failure ends the run with its status and a line.
+#include <dirent.h>
+#include <fcntl.h>
+#include <gtest/gtest.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <functional>
+#include <string>
+#include <vector>
+
+#include "robustness/robustness_support.h"
+
+namespace {
+
+using zr7test::make_dirs;
+using zr7test::read_file;
+using zr7test::SampleInstall;
+using zr7test::write_file;
+
+// Would exist after a run if any name had reached a shell.
+const char* const kCanary = "zr7canary";
+
+// Every byte but "/" and NUL alone and between letters, names a shell would
+// act on, option look-alikes, line breaks, blanks, and the longest name.
+std::vector<std::string> hostile_names() {
+    std::vector<std::string> names;
+    for (int b = 1; b < 256; ++b) {
+        if (b == '/')
+            continue;
+        const std::string byte(1, static_cast<char>(b));
+        if (byte != ".")
+            names.push_back(byte);
+        names.push_back("a" + byte + "z");
+    }
+    const std::string c = kCanary;
+    const std::vector<std::string> shell_bait = {"$(touch " + c + ")",
+                                                 "`touch " + c + "`",
+                                                 ";touch " + c,
+                                                 "|touch " + c,
+                                                 "&touch " + c,
+                                                 "&&touch " + c + "&&",
+                                                 ">" + c,
+                                                 "<" + c,
+                                                 "'\";touch " + c + ";'",
+                                                 "\ntouch " + c + "\n",
+                                                 "${IFS}touch${IFS}" + c,
+                                                 "*",
+                                                 "?",
+                                                 "[a-z]",
+                                                 "~",
+                                                 "!!",
+                                                 "-",
+                                                 "--",
+                                                 "-rf",
+                                                 "--help",
+                                                 "-o x",
+                                                 " ",
+                                                 "  lead",
+                                                 "trail  ",
+                                                 "\t",
+                                                 "\r\n",
+                                                 "..."};
+    names.insert(names.end(), shell_bait.begin(), shell_bait.end());
+    names.push_back(std::string(255, 'n'));
+    return names;
+}
+
+std::string without_cr(std::string text) {
+    text.erase(std::remove(text.begin(), text.end(), '\r'), text.end());
+    return text;
+}
+
+bool canary_anywhere(const std::string& dir) {
+    for (const auto& entry : zr7rb::snapshot(dir)) {
+        const std::string& path = entry.first;
+        const std::size_t slash = path.rfind('/');
+        if (path.substr(slash == std::string::npos ? 0 : slash + 1) == kCanary)
+            return true;
+    }
+    return false;
+}
+
+// The entries of `dir` whose names the image put there, as a snapshot keyed
+// by name.
+zr7rb::Snapshot only(const zr7rb::Snapshot& all, const std::string& prefix) {
+    zr7rb::Snapshot out;
+    for (const auto& entry : all) {
+        if (entry.first.compare(0, prefix.size(), prefix) == 0)
+            out[entry.first.substr(prefix.size())] = entry.second;
+    }
+    return out;
+}
+
+TEST(HostileImage, EveryNameLandsExactlyAndNothingRuns) {
+    SampleInstall s;
+    const std::string msrv = s.image + "/MSRV";
+    const std::string table = msrv + "/" + s.arch + "/TABLE";
+    const std::vector<std::string> names = hostile_names();
+    zr7rb::Snapshot flat;
+    zr7rb::Snapshot tree;
+    zr7rb::Snapshot sql;
+    make_dirs(table + "/dirs");
+    make_dirs(table + "/files");
+    for (const std::string& name : names) {
+        const std::string content = "line\r\n" + name + "\r\n";
+        write_file(msrv + "/ATTRLIB/" + name, content);
+        flat[name] = "f" + without_cr(content);
+        write_file(table + "/files/" + name, content);
+        tree["files/" + name] = "f" + content;
+        make_dirs(table + "/dirs/" + name);
+        write_file(table + "/dirs/" + name + "/inside", content);
+        tree["dirs/" + name] = "d";
+        tree["dirs/" + name + "/inside"] = "f" + content;
+        const std::string sql_name = name.substr(0, 250) + ".txt";
+        write_file(msrv + "/SQLLIB/" + sql_name, content);
+        sql[sql_name] = "f" + without_cr(content);
+    }
+    // Seeded names: the loader is handed each one as it is.
+    const std::vector<std::string> seeded = {"$(touch " + std::string(kCanary) + ").sql", "-rf.sql",
+                                             "a b.sql", "`x`;y.sql", "\xff\x01.sql"};
+    for (const std::string& name : seeded)
+        write_file(msrv + "/SQLLIB/" + name, "INSERT INTO T VALUES (1);\n");
+    const zr7rb::Snapshot image_before = zr7rb::snapshot(s.image);
+
+    const std::string sandbox = s.root / "sandbox";
+    make_dirs(sandbox);
+    zr7rb::Launch launch = zr7rb::relaunch_launch(s);
+    launch.cwd = sandbox;
+    const zr7test::RunResult r = zr7rb::run_captured(launch);
+    const std::string log = read_file(s.home + "/logs/qsdinst.log");
+    ASSERT_EQ(r.exit_code, 0) << r.err << log.substr(log.size() > 4000 ? log.size() - 4000 : 0);
+
+    const zr7rb::Snapshot home = zr7rb::snapshot(s.home);
+    for (const char* table_dir : {"tables/SRV1/ATTRLIB/", "tables/cicatrsq/ATTRLIB/"}) {
+        zr7rb::Snapshot got = only(home, table_dir);
+        got.erase("kzr.atr");
+        EXPECT_TRUE(got == flat) << table_dir;
+    }
+    for (const char* part : {"dirs/", "files/"})
+        EXPECT_TRUE(only(home, std::string("tables/SRV1/") + part) == only(tree, part)) << part;
+    const std::string catalog = read_file(s.cicatrsq() + "/qdsload.catalog");
+    zr7rb::Snapshot landed_sql = only(home, "tables/cicatrsq/SQLLIB/");
+    for (const auto& entry : sql)
+        EXPECT_EQ(landed_sql[entry.first], entry.second);
+    for (const std::string& name : seeded)
+        EXPECT_NE(catalog.find(" loaded <" + name + "> "), std::string::npos) << name;
+    EXPECT_EQ(read_file(s.vxaenv), zr7test::kSampleVxaenv);
+    EXPECT_TRUE(zr7rb::snapshot(s.image) == image_before);
+    EXPECT_FALSE(canary_anywhere(s.root.path()));
+    zr7rb::report("hostile names tried", static_cast<long long>(names.size() + seeded.size()));
+    zr7rb::report("files and directories landed",
+                  static_cast<long long>(2 * flat.size() + tree.size() + sql.size()));
+}
+
+// A chain of directories `depth` deep, each named `name`, a file at every
+// level. Built one level at a time from the level above, so that paths longer
+// than the system takes can be made, and removed the same way.
+void deep_tree(const std::string& top, int depth, const std::string& name) {
+    int fd = ::open(top.c_str(), O_RDONLY | O_DIRECTORY);
+    for (int level = 0; level < depth && fd >= 0; ++level) {
+        ::mkdirat(fd, name.c_str(), 0755);
+        const int next = ::openat(fd, name.c_str(), O_RDONLY | O_DIRECTORY);
+        ::close(fd);
+        fd = next;
+        const int file = ::openat(fd, "level", O_WRONLY | O_CREAT | O_TRUNC, 0644);
+        const std::string text = std::to_string(level);
+        EXPECT_EQ(::write(file, text.data(), text.size()), static_cast<ssize_t>(text.size()));
+        ::close(file);
+    }
+    ::close(fd);
+}
+
+void remove_at(int parent, const std::string& name) {
+    const int fd = ::openat(parent, name.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW);
+    if (fd < 0) {
+        ::unlinkat(parent, name.c_str(), 0);
+        return;
+    }
+    DIR* dir = ::fdopendir(fd);
+    std::vector<std::string> names;
+    while (const struct dirent* entry = ::readdir(dir)) {
+        if (std::string(entry->d_name) != "." && std::string(entry->d_name) != "..")
+            names.push_back(entry->d_name);
+    }
+    for (const std::string& inner : names)
+        remove_at(::dirfd(dir), inner);
+    ::closedir(dir);
+    ::unlinkat(parent, name.c_str(), AT_REMOVEDIR);
+}
+
+// Removes what `deep_tree` made under both trees before the scratch
+// directory goes, which cannot reach that deep by path.
+struct DeepTreeGuard {
+    std::vector<std::string> tops;
+    std::string name;
+    ~DeepTreeGuard() {
+        for (const std::string& top : tops) {
+            const int fd = ::open(top.c_str(), O_RDONLY | O_DIRECTORY);
+            remove_at(fd, name);
+            ::close(fd);
+        }
+    }
+};
+
+TEST(HostileImage, TwoHundredLevelsDeepLandWhole) {
+    SampleInstall s;
+    deep_tree(s.image + "/MSRV/" + s.arch + "/TABLE", 200, "d");
+    const zr7test::RunResult r = zr7rb::run_captured(zr7rb::install_launch(s));
+    ASSERT_EQ(r.exit_code, 0) << r.err;
+    std::string dir = s.tables();
+    for (int level = 0; level < 200; ++level) {
+        dir += "/d";
+        ASSERT_EQ(read_file(dir + "/level"), std::to_string(level)) << "level " << level;
+    }
+    zr7rb::report("tree depth", 200);
+}
+
+TEST(HostileImage, PathsBeyondTheSystemLimitFailTheRunInsteadOfVanishing) {
+    SampleInstall s;
+    // 200 levels of 30-byte names: the source paths outgrow PATH_MAX.
+    const std::string name(30, 'p');
+    DeepTreeGuard guard{{s.image + "/MSRV/" + s.arch + "/TABLE", s.tables()}, name};
+    deep_tree(guard.tops[0], 200, name);
+    const zr7test::RunResult r = zr7rb::run_captured(zr7rb::install_launch(s));
+    EXPECT_EQ(r.exit_code, 251) << r.err;
+    EXPECT_TRUE(zr7rb::has_line(r.out, "Error: Can't access <")) << r.out.substr(0, 2000);
+    EXPECT_EQ(read_file(s.vxaenv), zr7test::kSampleVxaenv);
+}
+
+TEST(HostileImage, AWideDirectoryLandsWhole) {
+    SampleInstall s;
+    const int count = zr7rb::scaled(500, 20000);
+    const std::string lib = s.image + "/MSRV/" + s.arch + "/lib";
+    for (int i = 0; i < count; ++i)
+        write_file(lib + "/f" + std::to_string(i), std::to_string(i));
+    const zr7test::RunResult r = zr7rb::run_captured(zr7rb::install_launch(s));
+    ASSERT_EQ(r.exit_code, 0) << r.err;
+    const std::string dst = s.home + "/" + s.arch + "/ms/lib";
+    EXPECT_EQ(zr7test::list_dir(dst).size(), static_cast<std::size_t>(count) + 1);
+    for (int i = 0; i < count; ++i)
+        ASSERT_EQ(read_file(dst + "/f" + std::to_string(i)), std::to_string(i));
+    zr7rb::report("files in one directory", count);
+}
+
+// One odd shape of image or installation, and what the run must make of it.
+struct ShapeCase {
+    const char* name;
+    std::function<void(const SampleInstall&)> shape;
+    int exit_code;
+    const char* line;  // a text the output must hold, "" for none
+    std::function<bool(const SampleInstall&)> check;
+    bool as_nobody = false;
+};
+
+std::string table_of(const SampleInstall& s) {
+    return s.image + "/MSRV/" + s.arch + "/TABLE";
+}
+void link_at(const std::string& target, const std::string& path) {
+    ASSERT_EQ(::symlink(target.c_str(), path.c_str()), 0) << path;
+}
+void replace_by_file(const std::string& dir) {
+    zr7test::remove_tree(dir);
+    write_file(dir, "not a directory\n");
+}
+void replace_by_dir(const std::string& file) {
+    ::unlink(file.c_str());
+    make_dirs(file);
+}
+bool is_file_with(const std::string& path, const std::string& content) {
+    struct stat st {};
+    return ::lstat(path.c_str(), &st) == 0 && S_ISREG(st.st_mode) && read_file(path) == content;
+}
+bool absent(const std::string& path) {
+    return !zr7test::exists(path);
+}
+bool always(const SampleInstall&) {
+    return true;
+}
+
+const ShapeCase kShapes[] = {
+    {"link_to_file",
+     [](const SampleInstall& s) { link_at(table_of(s) + "/table.dat", table_of(s) + "/ln"); }, 0,
+     "", [](const SampleInstall& s) { return is_file_with(s.tables() + "/ln", "table\r\n"); }},
+    {"link_to_directory",
+     [](const SampleInstall& s) { link_at(table_of(s) + "/sub", table_of(s) + "/lnd"); }, 0, "",
+     [](const SampleInstall& s) {
+         return is_file_with(s.tables() + "/lnd/deeper/nested.dat", "nested\r\n");
+     }},
+    {"dangling_link",
+     [](const SampleInstall& s) { link_at(s.root / "nowhere", table_of(s) + "/dangling"); }, 0, "",
+     [](const SampleInstall& s) { return absent(s.tables() + "/dangling"); }},
+    {"looping_links",
+     [](const SampleInstall& s) {
+         link_at(table_of(s) + "/loop_b", table_of(s) + "/loop_a");
+         link_at(table_of(s) + "/loop_a", table_of(s) + "/loop_b");
+     },
+     0, "", [](const SampleInstall& s) { return absent(s.tables() + "/loop_a"); }},
+    {"link_to_an_ancestor", [](const SampleInstall& s) { link_at("..", table_of(s) + "/sub/up"); },
+     251, "Error: Directory loop at <", always},
+    {"flat_source_link_to_file",
+     [](const SampleInstall& s) {
+         link_at(s.image + "/MSRV/ATTRLIB/kzr.atr", s.image + "/MSRV/ATTRLIB/ln.atr");
+     },
+     0, "",
+     [](const SampleInstall& s) {
+         return is_file_with(s.tables() + "/ATTRLIB/ln.atr", "name kzr\nattr one\n");
+     }},
+    {"flat_source_dangling_link",
+     [](const SampleInstall& s) { link_at(s.root / "nowhere", s.image + "/MSRV/ATTRLIB/gone"); }, 0,
+     "", [](const SampleInstall& s) { return absent(s.tables() + "/ATTRLIB/gone"); }},
+    {"flat_source_is_a_file",
+     [](const SampleInstall& s) { replace_by_file(s.image + "/MSRV/ATTRLIB"); }, 0,
+     "No file to process in <", always},
+    {"tree_source_is_a_file", [](const SampleInstall& s) { replace_by_file(table_of(s)); }, 251,
+     "Error: Can't open <", always},
+    {"seed_source_is_a_file",
+     [](const SampleInstall& s) { replace_by_file(s.image + "/MSRV/SQLLIB"); }, 249,
+     "Error: Can't open <", always},
+    {"file_where_the_tree_has_a_directory",
+     [](const SampleInstall& s) { write_file(s.tables() + "/sub", "a file\n"); }, 251,
+     "Error: Unable to create directory <",
+     [](const SampleInstall& s) { return is_file_with(s.tables() + "/sub", "a file\n"); }},
+    {"directory_where_a_file_goes",
+     [](const SampleInstall& s) { replace_by_dir(s.tables() + "/ATTRLIB/kzr.atr"); }, 251,
+     "Error: Copy src <", always},
+    {"destination_directory_missing",
+     [](const SampleInstall& s) { zr7test::remove_tree(s.tables() + "/RKDSCATL"); }, 251,
+     "Error: Copy src <", always},
+    {"unreadable_flat_file",
+     [](const SampleInstall& s) { ::chmod((s.image + "/MSRV/ATTRLIB/kzr.atr").c_str(), 0); }, 251,
+     "Error: Copy src <", always, true},
+    {"unreadable_flat_directory",
+     [](const SampleInstall& s) { ::chmod((s.image + "/MSRV/ATTRLIB").c_str(), 0); }, 249,
+     "Error: Can't open <", always, true},
+    {"unsearchable_flat_directory",
+     [](const SampleInstall& s) { ::chmod((s.image + "/MSRV/ATTRLIB").c_str(), 0444); }, 249,
+     "Error: Can't access <", always, true},
+    {"unreadable_tree_file",
+     [](const SampleInstall& s) { ::chmod((table_of(s) + "/table.dat").c_str(), 0); }, 251,
+     "Error: Copy src <", always, true},
+    {"unreadable_tree_directory",
+     [](const SampleInstall& s) { ::chmod((table_of(s) + "/sub").c_str(), 0); }, 251,
+     "Error: Can't open <", always, true},
+    {"unreadable_sql_file",
+     [](const SampleInstall& s) { ::chmod((s.image + "/MSRV/SQLLIB/kzr_a.sql").c_str(), 0); }, 251,
+     "Error: Copy src <", always, true},
+};
+
+class ImageShape : public ::testing::TestWithParam<ShapeCase> {};
+
+TEST_P(ImageShape, EndsWithItsStatusAndLine) {
+    const ShapeCase& c = GetParam();
+    SampleInstall s;
+    zr7rb::Launch launch = zr7rb::install_launch(s);
+    if (c.as_nobody) {
+        if (!zr7rb::can_drop_privileges())
+            GTEST_SKIP() << "cannot run as an unprivileged user here";
+        zr7rb::give_tree_to_nobody(s.root.path());
+        launch.as_nobody = true;
+    }
+    c.shape(s);
+    const zr7test::RunResult r = zr7rb::run_captured(launch);
+    EXPECT_EQ(r.exit_code, c.exit_code) << r.err << r.out.substr(0, 3000);
+    EXPECT_TRUE(zr7rb::has_line(r.out, "Exiting with rc <"));
+    if (*c.line != '\0') {
+        EXPECT_TRUE(zr7rb::has_line(r.out, c.line)) << c.line;
+    }
+    if (c.exit_code != 0) {
+        EXPECT_TRUE(zr7rb::has_line(r.out, "Error: ")) << "a failure needs a line";
+    }
+    EXPECT_TRUE(c.check(s));
+    EXPECT_EQ(read_file(s.vxaenv), zr7test::kSampleVxaenv);
+}
+
+std::string shape_name(const ::testing::TestParamInfo<ShapeCase>& shape) {
+    return shape.param.name;
+}
+
+INSTANTIATE_TEST_SUITE_P(Shapes, ImageShape, ::testing::ValuesIn(kShapes), shape_name);
+
+}  // namespace

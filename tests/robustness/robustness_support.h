@@ -1,0 +1,67 @@
+// What the robustness tests share: starting the tool under the limits a test
+// imposes (a file size limit, another user, a process group of its own),
+// snapshots of directory trees, and the figures each part reports.
+#pragma once
+
+#include <sys/types.h>
+
+#include <map>
+#include <string>
+#include <vector>
+
+#include "support/test_support.h"
+
+namespace zr7rb {
+
+// ZR7_SOAK=1 (set by `make soak`) selects the long variants.
+bool soak();
+int scaled(int quick, int long_run);
+
+// Prints a figure and records it as a property of the running test.
+void report(const std::string& what, long long count);
+
+// One start of a program by fork and exec. The environment is the test's,
+// with build/bin first on PATH, the variables that steer the tool removed,
+// then `env` applied.
+struct Launch {
+    std::vector<std::string> argv;  // argv[0]: the program's path
+    std::map<std::string, std::string> env;
+    std::string cwd;
+    long long file_size_limit = -1;  // RLIMIT_FSIZE in bytes, SIGXFSZ ignored
+    bool as_nobody = false;          // setgid and setuid 65534 before exec
+    std::string output_path;         // standard output and error (start only)
+};
+
+// The installing invocation of the tool on a sample installation, every
+// trace class on: "-o <home>/logs/ -h <home> <extra...> <image>".
+Launch install_launch(const zr7test::SampleInstall& s, const std::vector<std::string>& extra = {});
+// The same without "-o": the tool relaunches itself with its log.
+Launch relaunch_launch(const zr7test::SampleInstall& s, const std::vector<std::string>& extra = {});
+
+// Starts the program in a process group of its own (so that kill(-pid, ...)
+// reaches its children too) with output to `output_path` or /dev/null.
+pid_t start(const Launch& launch);
+// Waits for it: 0..255, or 128+N for signal N.
+int wait_for(pid_t pid);
+// Starts it with its output read through pipes, which no file size limit
+// reaches, and waits for it.
+zr7test::RunResult run_captured(const Launch& launch);
+
+// Whether dropping to the unprivileged user works here (root, and a kernel
+// that lets it); the tests that need it skip otherwise.
+bool can_drop_privileges();
+// Hands a whole tree to that user, so that it can work in it.
+void give_tree_to_nobody(const std::string& path);
+
+// Every entry under a directory, without following links: "d" for a
+// directory, "l" + target for a link, "f" + content for anything else.
+using Snapshot = std::map<std::string, std::string>;
+Snapshot snapshot(const std::string& dir);
+
+// Paths of the files under a directory whose names end with `suffix`.
+std::vector<std::string> find_named(const std::string& dir, const std::string& suffix);
+
+// Whether a captured output holds a line containing `text`.
+bool has_line(const std::string& output, const std::string& text);
+
+}  // namespace zr7rb
