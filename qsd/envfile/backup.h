@@ -1,0 +1,22 @@
+// Backups of a server file: a copy under ".archive" beside it, named after
+// the file and the time, made before the file changes. Backups are only ever
+// added; an existing one is never replaced.
+#pragma once
+
+#include <ctime>
+#include <string>
+
+namespace zr7 {
+
+// Seconds since 1 January 1901 00:00:00 UTC as an unsigned 32-bit count
+// (wrapping in February 2037), from the system clock's seconds since 1970.
+unsigned backup_stamp(std::time_t now);
+
+// Copies `dir`/`file` to `base`/.archive/`file`_<stamp>, taking the next
+// free stamp when that name is taken. The backup appears under its name
+// only once it is complete and on the disk. 0 with the backup's path in
+// `made`, or -9.
+int backup_file(const char* dir, const char* file, const char* base, unsigned stamp,
+                std::string& made);
+
+}  // namespace zr7
