@@ -8,6 +8,7 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <cctype>
 #include <cerrno>
 #include <csignal>
 #include <cstdio>
@@ -15,6 +16,8 @@
 #include <stdexcept>
 
 #include <gtest/gtest.h>
+
+#include "qsd/envfile/env_rewrite.h"
 
 extern char** environ;
 
@@ -247,6 +250,28 @@ std::vector<std::string> find_named(const std::string& dir, const std::string& s
         if (path.size() >= suffix.size() &&
             path.compare(path.size() - suffix.size(), suffix.size(), suffix) == 0)
             found.push_back(dir + "/" + path);
+    }
+    return found;
+}
+
+std::vector<std::string> change_options(int n) {
+    const std::string id = std::to_string(n);
+    return {"-m", "MOD" + id, "-c", "KEY" + id + "=value" + id};
+}
+
+std::string changed_by(const std::string& content, int n) {
+    const std::string id = std::to_string(n);
+    zr7::Dictionary settings;
+    settings.insert("KEY" + id, "value" + id);
+    return zr7::rewrite_env_content(content, settings, "MOD" + id).content;
+}
+
+std::vector<std::string> backups(const zr7test::SampleInstall& s) {
+    std::vector<std::string> found;
+    const std::string archive = s.tables() + "/.archive";
+    for (const std::string& name : zr7test::list_dir(archive)) {
+        if (name.compare(0, 7, "VXAENV_") == 0)
+            found.push_back(archive + "/" + name);
     }
     return found;
 }

@@ -61,6 +61,14 @@ Snapshot snapshot(const std::string& dir);
 // Paths of the files under a directory whose names end with `suffix`.
 std::vector<std::string> find_named(const std::string& dir, const std::string& suffix);
 
+// Run `n` of a series changes VXAENV with its own module and setting:
+// "-m MOD<n> -c KEY<n>=value<n>".
+std::vector<std::string> change_options(int n);
+// What the environment file update makes of `content` for run `n`.
+std::string changed_by(const std::string& content, int n);
+// The backups (VXAENV_<stamp>) of a sample installation's VXAENV, as paths.
+std::vector<std::string> backups(const zr7test::SampleInstall& s);
+
 // Whether a captured output holds a line containing `text`.
 bool has_line(const std::string& output, const std::string& text);
 
