@@ -107,7 +107,11 @@ int InstallUtil::copy_file(const char* src, const char* dst, unsigned flags) {
                                       : "cp -f " + quote_str(src) + " " + quote_str(dst);
         ZR7_DETAIL("...issuing cmd <%s>", shown.c_str());
     }
-    const int status = !dst_is_dir ? copy_into_place(src, dst, fix_cr != 0) : -5;
+    // Only a regular file is copied: a pipe in the image would hold the copy
+    // forever, a device could fill the disk.
+    struct stat src_st {};
+    const bool src_is_file = ::stat(src, &src_st) == 0 && S_ISREG(src_st.st_mode);
+    const int status = src_is_file && !dst_is_dir ? copy_into_place(src, dst, fix_cr != 0) : -5;
     if (status == 0)
         removeReadOnly(dst);
     ZR7_DETAIL("...rc = <%d>", status);

@@ -331,6 +331,17 @@ const ShapeCase kShapes[] = {
     {"destination_directory_missing",
      [](const SampleInstall& s) { zr7test::remove_tree(s.tables() + "/RKDSCATL"); }, 251,
      "Error: Copy src <", always},
+    {"pipe_in_the_image",
+     [](const SampleInstall& s) { ::mkfifo((s.image + "/MSRV/ATTRLIB/pipe").c_str(), 0644); }, 251,
+     "Error: Copy src <", always},
+    {"link_to_a_device_in_the_tree",
+     [](const SampleInstall& s) { link_at("/dev/zero", table_of(s) + "/zero"); }, 251,
+     "Error: Copy src <", always},
+    {"sql_name_with_a_line_break",
+     [](const SampleInstall& s) {
+         write_file(s.image + "/MSRV/SQLLIB/a.sql\nend\nb.sql", "SELECT 1;\n");
+     },
+     250, "the name holds a line break", always},
     {"unreadable_flat_file",
      [](const SampleInstall& s) { ::chmod((s.image + "/MSRV/ATTRLIB/kzr.atr").c_str(), 0); }, 251,
      "Error: Copy src <", always, true},

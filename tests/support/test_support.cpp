@@ -144,7 +144,16 @@ RunResult run(const std::string& program, const std::vector<std::string>& args,
         envp.push_back(e.data());
     envp.push_back(nullptr);
 
-    std::vector<std::string> argv_text{program};
+    // ZR7_TOOL_WRAPPER (words, the first a path) runs the tool under a
+    // checker such as valgrind; other programs run as they are.
+    std::vector<std::string> argv_text;
+    const char* wrapper = std::getenv("ZR7_TOOL_WRAPPER");
+    if (program == tool_path() && wrapper != nullptr) {
+        std::istringstream words(wrapper);
+        for (std::string word; words >> word;)
+            argv_text.push_back(word);
+    }
+    argv_text.push_back(program);
     argv_text.insert(argv_text.end(), args.begin(), args.end());
     std::vector<char*> argv;
     for (auto& a : argv_text)
@@ -164,7 +173,8 @@ RunResult run(const std::string& program, const std::vector<std::string>& args,
 
     RunResult result;
     pid_t pid = 0;
-    const int rc = posix_spawn(&pid, program.c_str(), &actions, nullptr, argv.data(), envp.data());
+    const int rc =
+        posix_spawn(&pid, argv_text[0].c_str(), &actions, nullptr, argv.data(), envp.data());
     posix_spawn_file_actions_destroy(&actions);
     if (rc != 0) {
         result.err = std::string("spawn failed: ") + std::strerror(rc);

@@ -46,7 +46,8 @@ struct RunOptions {
 };
 
 // Runs a program (a path) with arguments, capturing standard output and
-// standard error.
+// standard error. The tool runs under ZR7_TOOL_WRAPPER when that is set
+// (`make memcheck`: valgrind and its options).
 RunResult run(const std::string& program, const std::vector<std::string>& args,
               const RunOptions& options = {});
 
