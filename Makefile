@@ -46,7 +46,7 @@ MEMCHECK = $(shell command -v valgrind) -q --error-exitcode=99 --leak-check=full
 	--trace-children-skip=*/cp,*/tr,*/qdsload --log-file=$(CURDIR)/$(BUILD_MEMCHECK)/valgrind/%p.log
 memcheck:
 	cmake -S . -B $(BUILD_MEMCHECK) -G Ninja -DCMAKE_BUILD_TYPE=Debug -DZR7_SANITIZE=OFF
-	cmake --build $(BUILD_MEMCHECK) -j $(JOBS)
+	cmake --build $(BUILD_MEMCHECK) -j $(JOBS) --target test_e2e
 	rm -rf $(BUILD_MEMCHECK)/valgrind && mkdir -p $(BUILD_MEMCHECK)/valgrind
 	ZR7_TOOL_WRAPPER="$(MEMCHECK)" $(BUILD_MEMCHECK)/bin/test_e2e
 	@reports=$$(find $(BUILD_MEMCHECK)/valgrind -type f -size +0c); \
