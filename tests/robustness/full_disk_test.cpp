@@ -36,18 +36,24 @@ const FullDiskCase kCases[] = {
      4096,
      [](const SampleInstall& s) {
          write_file(s.image + "/MSRV/ATTRLIB/big.atr", std::string(8192, 'a'));
+         write_file(s.tables() + "/ATTRLIB/big.atr", "installed before\n");
      },
      {},
      251,
-     "Error: Copy src <"},
+     "Error: Copy src <",
+     "tables/SRV1/ATTRLIB/big.atr",
+     "installed before\n"},
     {"tree_copy",
      4096,
      [](const SampleInstall& s) {
          write_file(s.image + "/MSRV/" + s.arch + "/TABLE/big.dat", std::string(8192, 't'));
+         write_file(s.tables() + "/big.dat", "installed before\n");
      },
      {},
      251,
-     "Error: Copy src <"},
+     "Error: Copy src <",
+     "tables/SRV1/big.dat",
+     "installed before\n"},
     {"new_environment_file",
      4096,
      [](const SampleInstall& s) { write_file(s.vxaenv, std::string(4000, '#') + "\n"); },
