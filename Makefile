@@ -8,12 +8,13 @@ FUZZ_SECONDS ?= 60
 SANITIZER_OPTIONS = ASAN_OPTIONS=detect_leaks=1:abort_on_error=0 \
 	UBSAN_OPTIONS=print_stacktrace=1:halt_on_error=1
 
-.PHONY: all build test soak fuzz memcheck format clean
+.PHONY: all build test soak fuzz memcheck demo format clean
 
 all: build
 
+# The tool and the stand-in loader, optimised; the tests build under `test`.
 build:
-	cmake -S . -B $(BUILD_REL) -G Ninja -DCMAKE_BUILD_TYPE=RelWithDebInfo
+	cmake -S . -B $(BUILD_REL) -G Ninja -DCMAKE_BUILD_TYPE=RelWithDebInfo -DZR7_TESTS=OFF
 	cmake --build $(BUILD_REL) -j $(JOBS)
 
 # The whole suite, built with AddressSanitizer and UndefinedBehaviorSanitizer.
@@ -52,6 +53,11 @@ memcheck:
 	@reports=$$(find $(BUILD_MEMCHECK)/valgrind -type f -size +0c); \
 	if [ -n "$$reports" ]; then cat $$reports; echo "memcheck: errors reported"; exit 1; fi; \
 	echo "memcheck: $$(ls $(BUILD_MEMCHECK)/valgrind | wc -l) runs of the tool, no error, no leak"
+
+# A real installation of the sample under examples/ into a scratch copy in
+# $(BUILD_REL)/demo, then what it did.
+demo: build
+	examples/run-demo.sh $(BUILD_REL)
 
 format:
 	find qsd tests fuzz tools -name '*.cpp' -o -name '*.h' | xargs clang-format -i

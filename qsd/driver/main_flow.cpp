@@ -94,7 +94,7 @@ int run_main(int argc, char** argv) {
     }
 
     // The installing invocation: a progress line for a watching terminal.
-    progress_enable(::isatty(STDERR_FILENO) == 1);
+    progress_enable(progress_wanted(::isatty(STDERR_FILENO) == 1, ::isatty(STDOUT_FILENO) == 1));
 
     if (zr7_trace.detail()) {
         ZR7_DETAIL("Parameters begin-----------------");

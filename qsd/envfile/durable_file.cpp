@@ -3,6 +3,7 @@
 #include <fcntl.h>
 #include <sys/file.h>
 #include <sys/random.h>
+#include <sys/stat.h>
 #include <time.h>
 #include <unistd.h>
 
@@ -76,6 +77,20 @@ int create_unique_file(const std::string& prefix, std::string& path) {
     return -1;
 }
 
+int create_exclusive_file(const std::string& path) {
+    for (int attempt = 0; attempt < 2; ++attempt) {
+        const int fd =
+            ::open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, 0600);
+        if (fd >= 0 || errno != EEXIST)
+            return fd;
+        struct stat st {};
+        if (::lstat(path.c_str(), &st) != 0 || S_ISDIR(st.st_mode) || ::unlink(path.c_str()) != 0)
+            break;
+    }
+    errno = EEXIST;
+    return -1;
+}
+
 bool write_all(int fd, const std::string& data) {
     std::size_t done = 0;
     while (done < data.size()) {
@@ -101,27 +116,6 @@ int sync_path(const std::string& path) {
     const int status = ::fsync(fd) == 0 ? 0 : errno;
     ::close(fd);
     return status;
-}
-
-DirectoryLock::DirectoryLock(const std::string& dir) {
-    fd_ = ::open(dir.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
-    if (fd_ < 0) {
-        error_ = errno;
-        return;
-    }
-    while (::flock(fd_, LOCK_EX) != 0) {
-        if (errno != EINTR) {
-            error_ = errno;
-            return;
-        }
-    }
-    locked_ = true;
-}
-
-DirectoryLock::~DirectoryLock() {
-    // Closing the descriptor releases the lock.
-    if (fd_ >= 0)
-        ::close(fd_);
 }
 
 }  // namespace zr7

@@ -1,6 +1,5 @@
 // File-system steps that keep a server file whole whatever happens to the
-// process: exclusive scratch files, complete writes, syncs, and an advisory
-// lock on a directory.
+// process: exclusive scratch files, complete writes and syncs.
 #pragma once
 
 #include <string>
@@ -18,33 +17,16 @@ std::string base_part(const std::string& path);
 // Returns the open descriptor and sets `path`, or -1 with errno set.
 int create_unique_file(const std::string& prefix, std::string& path);
 
+// Creates `path` exclusively, without following a link, mode 0600. What
+// already stands there (left by a run that was killed) is removed first, once.
+// Returns the open descriptor, or -1 with errno set.
+int create_exclusive_file(const std::string& path);
+
 // Writes every byte, going on after short writes. False on any failure
 // (a full disk, a file size limit, an I/O error), with errno set.
 bool write_all(int fd, const std::string& data);
 
 // Flushes a file or a directory to the disk. 0, or the error number.
 int sync_path(const std::string& path);
-
-// An exclusive advisory lock (flock) on a directory, held for the object's
-// life. Runs that lock the same directory take turns; the lock outlives any
-// rename of a file inside it, which a lock on the file itself would not.
-class DirectoryLock {
-  public:
-    explicit DirectoryLock(const std::string& dir);
-    ~DirectoryLock();
-    DirectoryLock(const DirectoryLock&) = delete;
-    DirectoryLock& operator=(const DirectoryLock&) = delete;
-
-    bool locked() const { return locked_; }
-    int error() const { return error_; }
-    // The directory's descriptor (-1 when it could not be opened), also
-    // good for syncing the directory.
-    int fd() const { return fd_; }
-
-  private:
-    int fd_ = -1;
-    bool locked_ = false;
-    int error_ = 0;
-};
 
 }  // namespace zr7

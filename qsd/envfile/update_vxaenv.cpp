@@ -17,6 +17,7 @@
 #include "qsd/envfile/env_rewrite.h"
 #include "qsd/fileops/install_util.h"
 #include "qsd/installer/installer610.h"
+#include "qsd/platform/directory_lock.h"
 #include "qsd/platform/file_io.h"
 #include "qsd/platform/progress.h"
 #include "qsd/platform/trace.h"
@@ -85,6 +86,12 @@ int Installer610::update_vxaenv(const std::string& dir_template) {
         ZR7_RETURN(-7);
     }
 
+    // The scratch file's name is settled (and shown) before anything is read;
+    // the file itself is made only when something changes. The process id
+    // keeps it apart from any other run's.
+    const std::string planned_new_path = target + ".new." + InstallUtil::get_pid();
+    ZR7_DETAIL("writing to <%s>", planned_new_path.c_str());
+
     // Held until the new file is in place: a run that waits here reads the
     // file that the run before it wrote.
     zr7::DirectoryLock lock(zr7::dir_part(target));
@@ -117,14 +124,13 @@ int Installer610::update_vxaenv(const std::string& dir_template) {
         ZR7_RETURN(0);
     }
 
-    std::string new_path;
-    const int fd = zr7::create_unique_file(target + ".new", new_path);
+    std::string new_path = planned_new_path;
+    const int fd = zr7::create_exclusive_file(new_path);
     if (fd < 0) {
-        ZR7_ERROR("Error: Can't open <%s>", (target + ".new").c_str());
+        ZR7_ERROR("Error: Can't open <%s>", new_path.c_str());
         zr7::progress_env_result(false, "");
         ZR7_RETURN(-8);
     }
-    ZR7_DETAIL("writing to <%s>", new_path.c_str());
 
     // Everything up to the rename leaves VXAENV as it was; the scratch file
     // goes on every way out that did not rename it.

@@ -1,5 +1,6 @@
 #include "qsd/fileops/install_util.h"
 #include "qsd/installer/installer610.h"
+#include "qsd/platform/directory_lock.h"
 #include "qsd/platform/progress.h"
 #include "qsd/platform/trace.h"
 
@@ -35,8 +36,20 @@ int Installer610::init(const std::string& src_dir, const std::string& home_dir) 
     ZR7_RETURN(status);
 }
 
+namespace {
+
+void report_wait(const std::string& home) {
+    ZR7_TRACED("Installer610::go");
+    ZR7_DETAIL("Waiting for another installation in <%s>", home.c_str());
+}
+
+}  // namespace
+
 int Installer610::go() {
     ZR7_OPERATION("Installer610::go");
+    // Two installations into one server take turns: their copies would race
+    // for the same files, and each must see the other's VXAENV.
+    zr7::DirectoryLock run_lock(home_path, report_wait);
     if (copying == 0)
         ZR7_DETAIL("Copying disabled");
     if (seeding == 0)

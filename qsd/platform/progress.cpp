@@ -1,108 +1,260 @@
 #include "qsd/platform/progress.h"
 
+#include <sys/ioctl.h>
+#include <unistd.h>
+
 #include <cstdio>
+
+#include "qsd/installer/simple_command.h"
 
 namespace zr7 {
 
 namespace {
 
-struct ProgressState {
+struct Display {
     bool on = false;
-    int command = 0;
-    int commands = 0;
-    long files_copied = 0;
-    long files_seeded = 0;
-    bool env_reported = false;
-    bool env_changed = false;
-    std::string backup;
-    std::string current;
+    ProgressState run;
+    std::string drawn;  // the line on the terminal now
+    std::size_t drawn_width = 0;
 };
 
-ProgressState& state() {
-    static ProgressState instance;
+Display& display() {
+    static Display instance;
     return instance;
 }
 
+// A command's source without its leading symbol directories:
+// "${SRCPATH}/${BINARCH}/TABLE/TECLIB" shows as "TABLE/TECLIB".
+std::string short_source(const std::string& source_template) {
+    std::string text = source_template;
+    while (text.compare(0, 2, "${") == 0) {
+        const std::size_t slash = text.find('/');
+        if (slash == std::string::npos)
+            break;
+        text.erase(0, slash + 1);
+    }
+    return text;
+}
+
+std::string command_text(const ProgressState& state) {
+    const std::string what = short_source(state.source_template);
+    switch (state.kind) {
+        case kFlatCopy:
+            return "copy " + what;
+        case kTreeCopy:
+            return "copy tree " + what;
+        case kUpdateEnv:
+            return "update VXAENV";
+        case kSeed:
+            return "seed " + what;
+        default:
+            return what;
+    }
+}
+
+std::string position(const ProgressState& state) {
+    return "[" + std::to_string(state.command) + "/" + std::to_string(state.commands) + "]";
+}
+
+// Length of the UTF-8 sequence that starts with `lead`, 0 when it cannot
+// start one.
+std::size_t sequence_length(unsigned char lead) {
+    if (lead < 0x80)
+        return 1;
+    if (lead >= 0xC2 && lead <= 0xDF)
+        return 2;
+    if (lead >= 0xE0 && lead <= 0xEF)
+        return 3;
+    if (lead >= 0xF0 && lead <= 0xF4)
+        return 4;
+    return 0;
+}
+
+// The code point of a well-formed sequence at `at`, or -1.
+long decode(const std::string& text, std::size_t at, std::size_t length) {
+    if (length == 0 || at + length > text.size())
+        return -1;
+    const auto lead = static_cast<unsigned char>(text[at]);
+    if (length == 1)
+        return lead;
+    long code = lead & (0x7F >> length);
+    for (std::size_t i = 1; i < length; ++i) {
+        const auto next = static_cast<unsigned char>(text[at + i]);
+        if ((next & 0xC0) != 0x80)
+            return -1;
+        code = (code << 6) | (next & 0x3F);
+    }
+    // Overlong forms, surrogates and code points past the last plane.
+    static const long kSmallest[] = {0, 0, 0x80, 0x800, 0x10000};
+    if (code < kSmallest[length] || (code >= 0xD800 && code <= 0xDFFF) || code > 0x10FFFF)
+        return -1;
+    return code;
+}
+
+// The first `columns` characters of a terminal-safe text.
+std::string first_columns(const std::string& text, std::size_t columns) {
+    std::size_t seen = 0;
+    for (std::size_t i = 0; i < text.size(); ++i) {
+        if ((static_cast<unsigned char>(text[i]) & 0xC0) != 0x80) {
+            if (seen == columns)
+                return text.substr(0, i);
+            ++seen;
+        }
+    }
+    return text;
+}
+
+std::size_t terminal_width() {
+    struct winsize size {};
+    if (::ioctl(STDERR_FILENO, TIOCGWINSZ, &size) == 0 && size.ws_col > 1)
+        return size.ws_col;
+    return 80;
+}
+
 void redraw() {
-    ProgressState& s = state();
-    std::string line = "[" + std::to_string(s.command) + "/" + std::to_string(s.commands) + "] " +
-                       std::to_string(s.files_copied) + " files copied";
-    if (s.files_seeded > 0)
-        line += ", " + std::to_string(s.files_seeded) + " seeded";
-    if (!s.current.empty())
-        line += "  " + s.current;
-    if (line.size() > 78)
-        line = line.substr(0, 75) + "...";
-    std::fprintf(stderr, "\r\033[K%s", line.c_str());
+    Display& d = display();
+    const std::string line = progress_line(d.run, terminal_width());
+    if (line == d.drawn)
+        return;
+    const std::size_t width = display_width(line);
+    std::string text = "\r" + line;
+    if (width < d.drawn_width)
+        text.append(d.drawn_width - width, ' ');
+    std::fputs(text.c_str(), stderr);
     std::fflush(stderr);
+    d.drawn = line;
+    d.drawn_width = width;
 }
 
 }  // namespace
 
+std::string terminal_safe(const std::string& text) {
+    std::string out;
+    out.reserve(text.size());
+    std::size_t i = 0;
+    while (i < text.size()) {
+        const std::size_t length = sequence_length(static_cast<unsigned char>(text[i]));
+        const long code = decode(text, i, length);
+        const bool printable = code >= 0x20 && code != 0x7F && !(code >= 0x80 && code < 0xA0);
+        if (printable) {
+            out.append(text, i, length);
+            i += length;
+        } else {
+            out += '?';
+            ++i;
+        }
+    }
+    return out;
+}
+
+std::size_t display_width(const std::string& text) {
+    std::size_t columns = 0;
+    for (char byte : text) {
+        if ((static_cast<unsigned char>(byte) & 0xC0) != 0x80)
+            ++columns;
+    }
+    return columns;
+}
+
+std::string progress_line(const ProgressState& state, std::size_t width) {
+    std::string line = position(state) + " " + command_text(state) +
+                       " | files: " + std::to_string(state.files_copied) + " copied, " +
+                       std::to_string(state.files_seeded) + " seeded";
+    if (!state.seeding.empty())
+        line += " | seeding " + state.seeding;
+    line = terminal_safe(line);
+    const std::size_t room = width > 1 ? width - 1 : 0;
+    if (display_width(line) > room)
+        line = room > 3 ? first_columns(line, room - 3) + "..." : first_columns(line, room);
+    return line;
+}
+
+std::string progress_summary(const ProgressState& state, int status) {
+    std::string text;
+    if (status == 0) {
+        text = "zr7inst: installation done\n";
+    } else {
+        text = "zr7inst: installation failed with rc <" + std::to_string(status) + ">";
+        if (state.command > 0)
+            text += " at " + position(state) + " " + terminal_safe(command_text(state));
+        text += "\n";
+    }
+    text += "  files copied: " + std::to_string(state.files_copied) + "\n";
+    text += "  files seeded: " + std::to_string(state.files_seeded) + "\n";
+    if (!state.env_reported) {
+        text += "  VXAENV: not updated\n";
+    } else if (!state.env_changed) {
+        text += "  VXAENV: unchanged\n";
+    } else if (state.backup.empty()) {
+        text += "  VXAENV: changed\n";
+    } else {
+        text += "  VXAENV: changed, backup " + terminal_safe(state.backup) + "\n";
+    }
+    return text;
+}
+
 void progress_enable(bool on) {
-    state().on = on;
+    display().on = on;
 }
 bool progress_enabled() {
-    return state().on;
+    return display().on;
+}
+bool progress_wanted(bool stderr_is_terminal, bool stdout_is_terminal) {
+    return stderr_is_terminal && !stdout_is_terminal;
 }
 
-void progress_command(int index, int count, int /*kind*/, const std::string& source_template) {
-    ProgressState& s = state();
-    s.command = index;
-    s.commands = count;
-    s.current = source_template;
-    if (s.on)
+void progress_command(int index, int count, int kind, const std::string& source_template) {
+    ProgressState& run = display().run;
+    run.command = index;
+    run.commands = count;
+    run.kind = kind;
+    run.source_template = source_template;
+    run.seeding.clear();
+    if (display().on)
         redraw();
 }
 
-void progress_file_copied(const std::string& destination) {
-    ProgressState& s = state();
-    ++s.files_copied;
-    if (!s.on)
-        return;
-    // Redrawing for every file would cost more than the copy of a small one.
-    if (s.files_copied % 16 == 1) {
-        s.current = destination;
+// A copy spawns a program; writing one short line to the terminal costs far
+// less, so the count is shown for every file.
+void progress_file_copied(const std::string& /*destination*/) {
+    ++display().run.files_copied;
+    if (display().on)
         redraw();
-    }
 }
 
 void progress_seeding(const std::string& file_name) {
-    ProgressState& s = state();
-    s.current = "seeding " + file_name;
-    if (s.on)
+    display().run.seeding = file_name;
+    if (display().on)
         redraw();
 }
 
 void progress_seeded(const std::string& /*file_name*/) {
-    ++state().files_seeded;
+    ProgressState& run = display().run;
+    ++run.files_seeded;
+    run.seeding.clear();
+    if (display().on)
+        redraw();
 }
 
 void progress_env_result(bool changed, const std::string& backup_path) {
-    ProgressState& s = state();
-    s.env_reported = true;
-    s.env_changed = changed;
-    s.backup = backup_path;
+    ProgressState& run = display().run;
+    run.env_reported = true;
+    run.env_changed = changed;
+    run.backup = backup_path;
 }
 
 void progress_finish(int status) {
-    ProgressState& s = state();
-    if (!s.on)
+    Display& d = display();
+    if (!d.on)
         return;
-    std::fprintf(stderr, "\r\033[K");
-    std::fprintf(stderr, "zr7inst: %s: %ld files copied, %ld files seeded",
-                 status == 0 ? "done" : "failed", s.files_copied, s.files_seeded);
-    if (s.env_reported) {
-        if (s.env_changed) {
-            std::fprintf(stderr, ", VXAENV changed (backup %s)", s.backup.c_str());
-        } else {
-            std::fprintf(stderr, ", VXAENV unchanged");
-        }
-    }
-    if (status != 0)
-        std::fprintf(stderr, ", status %d", status);
-    std::fprintf(stderr, "\n");
+    std::string text;
+    if (d.drawn_width > 0)
+        text = "\r" + std::string(d.drawn_width, ' ') + "\r";
+    text += progress_summary(d.run, status);
+    std::fputs(text.c_str(), stderr);
     std::fflush(stderr);
+    d.drawn.clear();
+    d.drawn_width = 0;
 }
 
 }  // namespace zr7

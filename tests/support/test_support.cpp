@@ -145,15 +145,17 @@ RunResult run(const std::string& program, const std::vector<std::string>& args,
     envp.push_back(nullptr);
 
     // ZR7_TOOL_WRAPPER (words, the first a path) runs the tool under a
-    // checker such as valgrind; other programs run as they are.
+    // checker such as valgrind; other programs, and the tool started under
+    // another argv[0] (which a checker would not pass on), run as they are.
     std::vector<std::string> argv_text;
     const char* wrapper = std::getenv("ZR7_TOOL_WRAPPER");
-    if (program == tool_path() && wrapper != nullptr) {
+    if (program == tool_path() && wrapper != nullptr && options.argv0.empty()) {
         std::istringstream words(wrapper);
         for (std::string word; words >> word;)
             argv_text.push_back(word);
     }
-    argv_text.push_back(program);
+    const std::string path = argv_text.empty() ? program : argv_text[0];
+    argv_text.push_back(options.argv0.empty() ? program : options.argv0);
     argv_text.insert(argv_text.end(), args.begin(), args.end());
     std::vector<char*> argv;
     for (auto& a : argv_text)
@@ -173,8 +175,7 @@ RunResult run(const std::string& program, const std::vector<std::string>& args,
 
     RunResult result;
     pid_t pid = 0;
-    const int rc =
-        posix_spawn(&pid, argv_text[0].c_str(), &actions, nullptr, argv.data(), envp.data());
+    const int rc = posix_spawn(&pid, path.c_str(), &actions, nullptr, argv.data(), envp.data());
     posix_spawn_file_actions_destroy(&actions);
     if (rc != 0) {
         result.err = std::string("spawn failed: ") + std::strerror(rc);

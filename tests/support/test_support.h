@@ -43,6 +43,7 @@ struct RunOptions {
     std::string cwd;                  // "" = the test's own
     std::string stdin_path;           // "" = /dev/null
     bool prepend_bin_to_path = true;  // build/bin first on PATH (the stand-in loader)
+    std::string argv0;                // "" = the program's path
 };
 
 // Runs a program (a path) with arguments, capturing standard output and

@@ -1,0 +1,1 @@
+INSERT INTO POLICY (NAME, ACTION) VALUES ('KZR_Notify', 'mail');
