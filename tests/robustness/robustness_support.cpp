@@ -13,6 +13,8 @@
 #include <csignal>
 #include <cstdio>
 #include <cstdlib>
+#include <fstream>
+#include <random>
 #include <stdexcept>
 
 #include <gtest/gtest.h>
@@ -243,17 +245,6 @@ Snapshot snapshot(const std::string& dir) {
     return out;
 }
 
-std::vector<std::string> find_named(const std::string& dir, const std::string& suffix) {
-    std::vector<std::string> found;
-    for (const auto& entry : snapshot(dir)) {
-        const std::string& path = entry.first;
-        if (path.size() >= suffix.size() &&
-            path.compare(path.size() - suffix.size(), suffix.size(), suffix) == 0)
-            found.push_back(dir + "/" + path);
-    }
-    return found;
-}
-
 std::vector<std::string> change_options(int n) {
     const std::string id = std::to_string(n);
     return {"-m", "MOD" + id, "-c", "KEY" + id + "=value" + id};
@@ -278,6 +269,130 @@ std::vector<std::string> backups(const zr7test::SampleInstall& s) {
 
 bool has_line(const std::string& output, const std::string& text) {
     return output.find(text) != std::string::npos;
+}
+
+std::string content_of(const std::string& path) {
+    struct stat st {};
+    return ::stat(path.c_str(), &st) == 0 && S_ISREG(st.st_mode) ? zr7test::read_file(path) : "";
+}
+
+namespace {
+
+std::vector<std::string> split(const std::string& text, const std::string& separator) {
+    std::vector<std::string> pieces;
+    std::size_t start = 0;
+    for (std::size_t at; (at = text.find(separator, start)) != std::string::npos;) {
+        pieces.push_back(text.substr(start, at - start));
+        start = at + separator.size();
+    }
+    pieces.push_back(text.substr(start));
+    return pieces;
+}
+
+std::string path_of(const zr7test::SampleInstall& s, const std::string& token) {
+    const std::string msrv = s.image + "/MSRV/";
+    const std::map<std::string, std::string> roots = {{"I/", msrv},
+                                                      {"A/", msrv + s.arch + "/"},
+                                                      {"T/", msrv + s.arch + "/TABLE/"},
+                                                      {"H/", s.tables() + "/"},
+                                                      {"O/", s.home + "/"},
+                                                      {"R/", s.root.path() + "/"}};
+    if (token == "K")
+        return s.home + "/config/.ConfigData/kmsenv";
+    if (token == "V")
+        return s.vxaenv;
+    const auto root = roots.find(token.substr(0, 2));
+    return root == roots.end() ? token : root->second + token.substr(2);
+}
+
+// A step as its word, its first argument and the rest.
+struct Step {
+    std::string word, first, rest;
+};
+
+Step parse(const std::string& text) {
+    Step step;
+    const std::size_t one = text.find(' ');
+    step.word = text.substr(0, one);
+    if (one == std::string::npos)
+        return step;
+    const std::size_t two = text.find(' ', one + 1);
+    step.first = text.substr(one + 1, two == std::string::npos ? std::string::npos : two - one - 1);
+    if (two != std::string::npos)
+        step.rest = text.substr(two + 1);
+    return step;
+}
+
+void append(const std::string& path, const std::string& text) {
+    std::ofstream(path, std::ios::binary | std::ios::app) << text;
+}
+
+}  // namespace
+
+void shape(const zr7test::SampleInstall& s, const std::string& steps) {
+    for (const std::string& text : split(steps, " ; ")) {
+        if (text.empty())
+            continue;
+        const Step step = parse(text);
+        // Most steps name their path first; "chmod" and "ln" name it last.
+        const bool path_last = step.word == "chmod" || step.word == "ln";
+        const std::string path = path_of(s, path_last ? step.rest : step.first);
+        const std::size_t slash = path.rfind('/');
+        if (!path_last && step.word != "append" && step.word != "repeat") {
+            zr7test::remove_tree(path);
+            zr7test::make_dirs(path.substr(0, slash == std::string::npos ? 0 : slash));
+        }
+        if (step.word == "file" || step.word == "append") {
+            append(path, step.rest);
+        } else if (step.word == "repeat") {
+            const std::size_t space = step.rest.find(' ');
+            const std::string line = step.rest.substr(space + 1) + "\n";
+            std::string text_block;
+            for (long i = std::stol(step.rest.substr(0, space)); i > 0; --i)
+                text_block += line;
+            append(path, text_block);
+        } else if (step.word == "fill") {
+            const std::size_t space = step.rest.find(' ');
+            const std::string prefix =
+                space == std::string::npos ? "" : step.rest.substr(space + 1);
+            append(path, prefix + std::string(std::stoul(step.rest.substr(0, space)), 'x') + "\n");
+        } else if (step.word == "garbage") {
+            std::mt19937 random(1901);
+            std::string bytes(std::stoul(step.rest.empty() ? "0" : step.rest), '\0');
+            for (char& c : bytes)
+                c = static_cast<char>(random() & 0xFF);
+            append(path, bytes);
+        } else if (step.word == "dir") {
+            zr7test::make_dirs(path);
+        } else if (step.word == "fifo") {
+            ::mkfifo(path.c_str(), 0644);
+        } else if (step.word == "chmod") {
+            ::chmod(path.c_str(), static_cast<mode_t>(std::stoul(step.first, nullptr, 8)));
+        } else if (step.word == "ln") {
+            zr7test::remove_tree(path);
+            EXPECT_EQ(::symlink(path_of(s, step.first).c_str(), path.c_str()), 0) << text;
+        } else if (step.word != "rm") {
+            ADD_FAILURE() << "unknown step: " << text;
+        }
+    }
+}
+
+bool holds(const zr7test::SampleInstall& s, const std::string& checks) {
+    for (const std::string& text : split(checks, " ; ")) {
+        const Step check = parse(text);
+        const std::string path = path_of(s, check.first);
+        struct stat st {};
+        const bool there = ::lstat(path.c_str(), &st) == 0;
+        const bool ok = check.word.empty() || (check.word == "no" && !there) ||
+                        (check.word == "link" && there && S_ISLNK(st.st_mode)) ||
+                        (check.word == "is" && there && S_ISREG(st.st_mode) &&
+                         zr7test::read_file(path) == check.rest);
+        if (!ok) {
+            ADD_FAILURE() << "does not hold: " << text;
+            return false;
+        }
+    }
+    return true;
 }
 
 }  // namespace zr7rb

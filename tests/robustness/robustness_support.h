@@ -58,9 +58,6 @@ void give_tree_to_nobody(const std::string& path);
 using Snapshot = std::map<std::string, std::string>;
 Snapshot snapshot(const std::string& dir);
 
-// Paths of the files under a directory whose names end with `suffix`.
-std::vector<std::string> find_named(const std::string& dir, const std::string& suffix);
-
 // Run `n` of a series changes VXAENV with its own module and setting:
 // "-m MOD<n> -c KEY<n>=value<n>".
 std::vector<std::string> change_options(int n);
@@ -71,5 +68,25 @@ std::vector<std::string> backups(const zr7test::SampleInstall& s);
 
 // Whether a captured output holds a line containing `text`.
 bool has_line(const std::string& output, const std::string& text);
+
+// The content of a regular file (through links), "" for anything else: a
+// test must not block on a pipe that a case put in place of a file.
+std::string content_of(const std::string& path);
+
+// Reshapes a sample installation by steps separated by " ; ". A path is K
+// (kmsenv), V (VXAENV), or begins with I/ (image/MSRV), A/ (its architecture
+// directory), T/ (the TABLE tree), H/ (the server's table directory), O/ (the
+// installation directory) or R/ (the scratch root); anything else is taken
+// as it is. Whatever stands at a path is replaced.
+//   file P TEXT    a file holding TEXT (the rest of the step)
+//   append P TEXT  TEXT added at the end
+//   repeat P N L   L and a newline added N times
+//   fill P N [X]   X, N bytes "x" and a newline
+//   garbage P N    N random bytes (fixed seed)
+//   dir P / fifo P / rm P / chmod MODE P / ln TARGET P
+void shape(const zr7test::SampleInstall& s, const std::string& steps);
+// Whether checks separated by " ; " hold: "is P TEXT" (a regular file
+// holding TEXT), "no P" (nothing there), "link P" (a symbolic link).
+bool holds(const zr7test::SampleInstall& s, const std::string& checks);
 
 }  // namespace zr7rb
