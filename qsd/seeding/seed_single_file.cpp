@@ -53,6 +53,13 @@ int Installer610::seed_single_file(const std::string& dst_dir, const std::string
             break;
     }
 
+    // The response file gives the loader one value a line: a name holding a
+    // line break would hand it lines of the image's choosing.
+    if (file_name.find('\n') != std::string::npos) {
+        ZR7_ERROR("Error: Can't seed <%s>: the name holds a line break", file_name.c_str());
+        ZR7_RETURN(-6);
+    }
+
     ZR7_DETAIL("Using SQLLIB <%s> ", dst_dir.c_str());
     const std::string sqllib = zr7::sqllib_entry(dst_dir);
     ZR7_DETAIL("seeding <%s> ", file_name.c_str());
