@@ -3,13 +3,13 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <string>
 #include <vector>
 
 #include "qsd/installer/installer610.h"
 #include "qsd/platform/trace.h"
 #include "support/test_support.h"
-#include "support/trace_lines.h"
 
 namespace {
 
@@ -76,10 +76,12 @@ TEST(ReadConfigTest, MissingFileReturnsTheErrorNumberAndChangesNothing) {
     zr7::trace_reconfigure("ERROR");
     Installer610 installer;
     installer.host_name = "before";
-    testing::internal::CaptureStdout();
-    EXPECT_EQ(installer.read_config(home.path() + "/"), 2);
-    EXPECT_TRUE(zr7test::lines_end_with(testing::internal::GetCapturedStdout(),
-                                        {"Error: Can't open kmsenv"}));
+    int rc = 0;
+    const std::string out =
+        zr7test::capture_stdout([&] { rc = installer.read_config(home.path() + "/"); });
+    EXPECT_EQ(rc, 2);
+    EXPECT_TRUE(zr7test::has_trace_line(out, "Error: Can't open kmsenv")) << out;
+    EXPECT_EQ(std::count(out.begin(), out.end(), '\n'), 1) << out;
     EXPECT_EQ(installer.host_name, "before");
     EXPECT_EQ(installer.family_setting, "");
 }

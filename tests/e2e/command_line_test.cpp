@@ -1,203 +1,107 @@
-// The built tool's command line: the version forms, the refusals, and the
-// home-directory lines. Every run that gets past the options carries "-o" so
-// no relaunch happens, and names a home without a server configuration, so
-// the run ends with status 2 right after the home directory is settled.
-#include <gtest/gtest.h>
-
-#include <algorithm>
+// The command line of the built tool (usage, version, refusals, the home
+// directory), what an install from the build puts in place, and the
+// stand-in loader's own checks.
 #include <map>
-#include <string>
-#include <vector>
 
-#include "support/test_support.h"
-#include "support/trace_lines.h"
+#include "e2e/e2e.h"
 
+namespace zr7test {
 namespace {
 
-using zr7test::RunOptions;
-using zr7test::RunResult;
+const char* const kUsage =
+    "Usage: zr7inst [-c key=val] [-e] [-f] [-h home] [-m mod] [-s] [-v ver] [-V] src_dir\n"
+    "  -c key=val Add key=val in VXAENV if not already there.\n"
+    "             or updates it to new value\n"
+    "  -e       Copy files only.  Skip seeding.\n"
+    "  -f       Force file copy.  (Deprecated)\n"
+    "  -h home  Installation directory.  If not specified here,\n"
+    "           then it must be defined thru env var MARLIN_HOME.\n"
+    "  -m mod   Use 'mod' as module name.  This will cause VXAENV\n"
+    "           to be updated, and 'mod' appended to KDS_RUN.\n"
+    "  -s       Seeding only.  Skip copying\n"
+    "  -v ver   Version of the source image.  Currently only\n"
+    "           610 is supported.  Default is 610.\n"
+    "  -V       Print out version as vvrrmmff.  If this is the\n"
+    "           only option, exit right away.\n";
 
-const char* const kNoHome = "No MARLIN_HOME or MARLINHOME found.  Defaulting to .";
-
-RunOptions clean_env(const std::string& trace = "") {
-    RunOptions options;
-    options.unset_env = {"MARLIN_HOME", "MARLINHOME", "VXA_TRC1"};
-    if (!trace.empty())
-        options.set_env["VXA_TRC1"] = trace;
-    return options;
-}
-
-RunResult run_tool(const std::vector<std::string>& args, const RunOptions& options) {
-    return zr7test::run(zr7test::tool_path(), args, options);
-}
-
-TEST(VersionTest, AloneItPrintsTheVersionAndEnds) {
-    const RunResult r = run_tool({"-V"}, clean_env());
-    EXPECT_EQ(r.exit_code, 0);
-    EXPECT_EQ(r.out, "06100400\n");
-    EXPECT_EQ(r.err, "");
-}
-
-TEST(VersionTest, WithOtherArgumentsItNamesTheProgramAndGoesOn) {
-    zr7test::TempDir home;
-    const RunResult r =
-        run_tool({"-V", "-o", home.path(), "-h", home.path(), "-V", "/img"}, clean_env());
-    const std::string line = zr7test::tool_path() + " version 06100400\n";
-    EXPECT_EQ(r.out.substr(0, 2 * line.size()), line + line);
-    EXPECT_EQ(r.exit_code, 2) << r.out;  // the home holds no server configuration
-    EXPECT_EQ(zr7test::count_lines_ending(r.out, "Error: Can't open kmsenv"), 1);
-    EXPECT_EQ(zr7test::lines_of(r.out).back(), "Exiting with rc <2>");
-    EXPECT_EQ(r.out.back(), '\n');
-}
-
-struct Refusal {
-    std::vector<std::string> args;
-    std::string err;
-    std::string trace;  // the error line that goes with it, or ""
-};
-
-TEST(RefusalTest, MessageOnStderrAndStatusMinus2) {
-    const std::vector<Refusal> cases = {
-        {{"-v", "6.1.0", "/img"}, "Error: Version 6.1.0 not supported\n", ""},
-        {{"-v", "0610", "/img"}, "Error: Version 0610 not supported\n", ""},
-        {{"-v", "610", "-v", "", "/img"}, "Error: Version  not supported\n", ""},
-        {{"-c", "a=1", "-c", "A=2", "/img"},
-         "Error: Bad env var A=2\n",
-         "Error: Duplicate key <A> specified in options"},
-        {{"-c", "Key=1", "-c", " kEY = 2", "/img"},
-         "Error: Bad env var  kEY = 2\n",
-         "Error: Duplicate key <KEY> specified in options"},
-        {{"-c", "kds_run=x", "/img"},
-         "Error: Bad env var kds_run=x\n",
-         "Error: Use -m to modify KDS_RUN"},
-        {{"-c", "=x", "/img"}, "Error: Bad env var =x\n", ""},
-        {{"-c", "novalue", "/img"}, "Error: Bad env var novalue\n", ""},
-        // The refusal comes before any check of the operands.
-        {{"-c", "x", "/img", "/other"}, "Error: Bad env var x\n", ""},
-    };
-    for (const Refusal& c : cases) {
-        const RunResult r = run_tool(c.args, clean_env());
-        EXPECT_EQ(r.exit_code, 254) << c.err;
-        EXPECT_EQ(r.err, c.err);
-        std::vector<std::string> lines;
-        if (!c.trace.empty())
-            lines.push_back(c.trace);
-        lines.push_back("Exiting with rc <-2>");
-        ASSERT_TRUE(zr7test::lines_end_with(r.out, lines)) << c.err;
-        // The closing line is a plain line, not a trace line.
-        EXPECT_EQ(zr7test::lines_of(r.out).back(), "Exiting with rc <-2>");
-        EXPECT_EQ(r.out.back(), '\n');
+TEST(CommandLine, BadOnesGiveTheUsageAndStatus254) {
+    const std::vector<std::string> cases[] = {
+        {}, {"-x", "/img"}, {"-h"}, {"/img", "/other"}, {"/img", "-e"}, {"-:", "/img"}, {""}};
+    for (const std::vector<std::string>& args : cases) {
+        const RunResult r = tool(args);
+        EXPECT_EQ(std::to_string(r.exit_code) + r.err, "254" + std::string(kUsage))
+            << testing::PrintToString(args);
     }
 }
 
-struct HomeCase {
-    const char* name;
-    std::vector<std::string> args;  // before "-o <dir> /img"; "@" stands for the home
-    std::map<std::string, std::string> env;
-    std::string first_line;  // "@" stands for the home
-    bool home_from_cwd;      // the home is the working directory "./"
-};
-
-std::string with_home(std::string text, const std::string& home) {
-    for (std::size_t at = text.find('@'); at != std::string::npos; at = text.find('@', at))
-        text.replace(at, 1, home);
-    return text;
-}
-
-TEST(HomeDirectoryTest, OptionThenEachVariableThenTheWorkingDirectory) {
-    const std::vector<HomeCase> cases = {
-        {"-h", {"-h", "@"}, {}, "", false},
-        {"-h glued", {"-h@"}, {{"MARLIN_HOME", "/elsewhere"}}, "", false},
-        {"-h with slash", {"-h", "@/"}, {}, "", false},
-        {"MARLIN_HOME", {}, {{"MARLIN_HOME", "@"}}, "MARLIN_HOME is <@>\n", false},
-        {"MARLIN_HOME blanks", {}, {{"MARLIN_HOME", "@  "}}, "MARLIN_HOME is <@  >\n", false},
-        {"MARLIN_HOME first",
-         {},
-         {{"MARLIN_HOME", "@"}, {"MARLINHOME", "/elsewhere"}},
-         "MARLIN_HOME is <@>\n",
-         false},
-        {"MARLINHOME", {}, {{"MARLINHOME", "@"}}, "MARLINHOME is <@>\n", false},
-        {"empty MARLIN_HOME",
-         {},
-         {{"MARLIN_HOME", ""}, {"MARLINHOME", "@/"}},
-         "MARLINHOME is <@/>\n",
-         false},
-        {"empty -h", {"-h", ""}, {{"MARLINHOME", "@"}}, "MARLINHOME is <@>\n", false},
-        {"neither", {}, {}, kNoHome, true},
-        {"both empty", {}, {{"MARLIN_HOME", ""}, {"MARLINHOME", ""}}, kNoHome, true},
+// Each run, in the sample's home, ends with options that copy and seed
+// nothing. Past the options the tool relaunches itself (the second run's
+// status comes back), which succeeds only where the home it settled on is ".".
+TEST(CommandLine, VersionRefusalsHomeAndTheRelaunchLine) {
+    const auto cmd = [](const std::string& args = "./", const std::string& log = "./qsdinst.log") {
+        return "Invoking cmd <" + tool_path() + " -o " + args + " -e -s ../image >>" + log + ">\n";
     };
-    for (const HomeCase& c : cases) {
-        zr7test::TempDir home;
-        // Only the installer's start shows its detail lines, so the home line
-        // comes first.
-        RunOptions options = clean_env("ERROR (UNIT:zr7.Installer610::init DETAIL)");
-        for (const auto& kv : c.env)
-            options.set_env[kv.first] = with_home(kv.second, home.path());
-        options.cwd = home.path();
-        std::vector<std::string> args;
-        for (const std::string& a : c.args)
-            args.push_back(with_home(a, home.path()));
-        args.insert(args.end(), {"-o", home.path(), "/img"});
-
-        const RunResult r = run_tool(args, options);
-        EXPECT_EQ(r.exit_code, 2) << c.name << "\n" << r.out;
-        EXPECT_EQ(r.err, "") << c.name;
-        const std::string first = with_home(c.first_line, home.path());
-        EXPECT_EQ(r.out.substr(0, first.size()), first) << c.name;
-        if (c.home_from_cwd) {
-            // No line end: the next output follows directly.
-            EXPECT_NE(r.out.at(first.size()), '\n') << c.name;
-        } else {
-            EXPECT_EQ(r.out.find("MARLIN"), first.empty() ? std::string::npos : 0u) << c.name;
-        }
-        const std::string used = c.home_from_cwd ? "./" : home.path() + "/";
-        EXPECT_EQ(zr7test::count_lines_ending(r.out, "home path...<" + used + ">"), 1)
-            << c.name << "\n"
-            << r.out;
-    }
-}
-
-TEST(SourceDirectoryTest, MsrvFollowsOneSeparator) {
-    const std::pair<const char*, const char*> cases[] = {
-        {"/img", "/img/MSRV/"}, {"/img/", "/img/MSRV/"}, {"/img//", "/img//MSRV/"}};
+    const std::string v = tool_path() + " version 06100400\n", no = "Exiting with rc <-2>\n";
+    // clang-format off
+    const struct { std::vector<std::string> args; std::map<std::string, std::string> env;
+                   int status; std::string out, err; } cases[] = {
+        {{"-V", "-h", ".", "-V"}, {}, 0, v + v + cmd("./ -V -h . -V"), ""},
+        {{"-v", "6.1.0"}, {}, 254, no, "Error: Version 6.1.0 not supported\n"},
+        {{"-v", "610", "-v", ""}, {}, 254, no, "Error: Version  not supported\n"},
+        {{"-c", "a=1", "-c", "A=2"}, {}, 254,
+         "Error: Duplicate key <A> specified in options\n" + no, "Error: Bad env var A=2\n"},
+        {{"-c", "kds_run=x"}, {}, 254, "Error: Use -m to modify KDS_RUN\n" + no,
+         "Error: Bad env var kds_run=x\n"},
+        {{"-c", "novalue"}, {}, 254, no, "Error: Bad env var novalue\n"},
+        {{"-h", "."}, {{"MARLIN_HOME", "/x"}}, 0, cmd("./ -h ."), ""},
+        {{}, {{"MARLIN_HOME", ".  "}}, 0, "MARLIN_HOME is <.  >\n" + cmd(), ""},
+        {{}, {{"MARLIN_HOME", "."}, {"MARLINHOME", "/x"}}, 0, "MARLIN_HOME is <.>\n" + cmd(), ""},
+        {{}, {{"MARLINHOME", "."}}, 0, "MARLINHOME is <.>\n" + cmd(), ""},
+        {{}, {}, 0, "No MARLIN_HOME or MARLINHOME found.  Defaulting to ." + cmd(), ""},
+        {{"-h", "my home", "-c", "K=a b"}, {}, 0,  // "my home" is a link to "."
+         cmd("\"my home/logs/\" -h \"my home\" -c \"K=a b\"", "\"my home/logs/qsdinst.log\""), ""},
+        {{"-h", "none"}, {}, 248, cmd("none/logs/ -h none", "none/logs/qsdinst.log"),
+         "Error: Can't open <none/logs/qsdinst.log>\n"}};
+    // clang-format on
     for (const auto& c : cases) {
-        zr7test::TempDir home;
-        const RunResult r = run_tool({"-e", "-s", "-o", home.path(), "-h", home.path(), c.first},
-                                     clean_env("ERROR (UNIT:zr7 ALL)"));
-        EXPECT_EQ(r.exit_code, 2);
-        EXPECT_EQ(zr7test::count_lines_ending(r.out, std::string("src path....<") + c.second + ">"),
-                  1)
-            << r.out;
+        SampleInstall s;
+        ::symlink(".", (s.home + "/my home").c_str());
+        RunOptions options;
+        options.cwd = s.home;
+        options.set_env = c.env;
+        std::vector<std::string> args = c.args;
+        args.insert(args.end(), {"-e", "-s", "../image"});
+        const RunResult r = tool(args, options);
+        EXPECT_EQ(std::to_string(r.exit_code) + r.err, std::to_string(c.status) + c.err) << r.out;
+        // All of the output, or its end after a trace line.
+        EXPECT_TRUE(r.out == c.out || (r.out[0] == '(' && ends_with(r.out, c.out))) << r.out;
+        EXPECT_EQ(exists(s.home + "/qsdinst.log"), c.out.find(">>./") != std::string::npos);
     }
 }
 
-TEST(ParameterTraceTest, EveryArgumentAfterTheProgramInOrder) {
-    zr7test::TempDir home;
-    const RunResult r =
-        run_tool({"-f", "-o", home.path(), "-h", home.path(), "-c", "a = b", "/img"},
-                 clean_env("ERROR (UNIT:zr7 ALL)"));
-    EXPECT_EQ(r.exit_code, 2);
-    const std::vector<std::string> expected = {"Parameters begin-----------------",
-                                               "....<-f>",
-                                               "....<-o>",
-                                               "....<" + home.path() + ">",
-                                               "....<-h>",
-                                               "....<" + home.path() + ">",
-                                               "....<-c>",
-                                               "....<a = b>",
-                                               "....</img>",
-                                               "Parameters end ------------------"};
-    const std::vector<std::string> lines = zr7test::lines_of(r.out);
-    std::size_t at = 0;
-    while (at < lines.size() && lines[at].find(expected[0]) == std::string::npos)
-        ++at;
-    ASSERT_LE(at + expected.size(), lines.size()) << r.out;
-    for (std::size_t i = 0; i < expected.size(); ++i) {
-        const std::string& line = lines[at + i];
-        EXPECT_EQ(line.substr(line.size() - std::min(line.size(), expected[i].size())),
-                  expected[i]);
+TEST(InstallRules, TheToolAndItsManualPageOnlyWhoseDashVAloneGivesTheVersion) {
+    TempDir to;
+    const std::string script =
+        "cmake --install \"$0\" --prefix \"$1\" >/dev/null && cd \"$1\" && "
+        "find . ! -type d | sort && bin/zr7inst -V";
+    const RunResult r = run("/bin/sh", {"-c", script, bin_dir() + "/..", to.path()});
+    EXPECT_EQ(std::to_string(r.exit_code) + r.out + r.err,
+              "0./bin/zr7inst\n./share/man/man1/zr7inst.1\n06100400\n");
+}
+
+TEST(StandInLoader, RefusesBadResponseFiles) {
+    TempDir tmp;
+    make_dirs(tmp / "SQLLIB");
+    write_file(tmp / "SQLLIB/a.sql", "SELECT 1;\n");
+    RunOptions options;
+    options.stdin_path = tmp / "rsp";
+    options.set_env = {{"KDC_FAMILIES", "PORT:1918 ip.pipe USE:Y"}, {"SQLLIB", tmp / "SQLLIB"}};
+    for (const char* response : {"ip.pipe\nh\n1918\na.sql\nend\n", "ip.pipe\nh\n1918\na.sql",
+                                 "\nh\n1918\na.sql\nend", "ip.pipe\nh\n1918\n../a.sql\nend"}) {
+        write_file(tmp / "rsp", response);
+        EXPECT_EQ(run(bin_dir() + "/qdsload", {}, options).exit_code, 1) << response;
     }
-    EXPECT_EQ(zr7test::count_lines_ending(r.out, "Exiting with rc <2>"), 2) << r.out;
 }
 
 }  // namespace
+}  // namespace zr7test

@@ -12,7 +12,6 @@
 #include "qsd/fileops/copy_options.h"
 #include "qsd/fileops/install_util.h"
 #include "qsd/platform/trace.h"
-#include "support/stdout_capture.h"
 #include "support/test_support.h"
 
 namespace {

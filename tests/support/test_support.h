@@ -1,6 +1,8 @@
-// Helpers shared by the test programs: scratch directories, files, running
-// the built tool, and a sample server installation with a source image.
+// Helpers shared by the test programs: scratch files, running a program (the
+// tool above all), a sample server installation, trace lines on standard output.
 #pragma once
+
+#include <gtest/gtest.h>
 
 #include <map>
 #include <string>
@@ -8,12 +10,18 @@
 
 namespace zr7test {
 
-// A fresh directory under the system's scratch area, removed with its
-// contents when the object goes away.
+void make_dirs(const std::string& path);
+void write_file(const std::string& path, const std::string& content, unsigned mode = 0644);
+std::string read_file(const std::string& path);
+bool exists(const std::string& path);  // a link counts, wherever it points
+void remove_tree(const std::string& path);
+std::vector<std::string> list_dir(const std::string& path);  // sorted, no "." or ".."
+
+// A fresh scratch directory, removed with its contents when the object goes away.
 class TempDir {
   public:
     TempDir();
-    ~TempDir();
+    ~TempDir() { remove_tree(path_); }
     TempDir(const TempDir&) = delete;
     TempDir& operator=(const TempDir&) = delete;
     const std::string& path() const { return path_; }
@@ -23,59 +31,49 @@ class TempDir {
     std::string path_;
 };
 
-void make_dirs(const std::string& path);
-void write_file(const std::string& path, const std::string& content, unsigned mode = 0644);
-std::string read_file(const std::string& path);
-bool exists(const std::string& path);
-void remove_tree(const std::string& path);
-// Names in a directory, sorted; "." and ".." left out.
-std::vector<std::string> list_dir(const std::string& path);
-
 struct RunResult {
-    int exit_code = -1;  // 0..255, or 128+N for signal N
-    std::string out;
-    std::string err;
+    int exit_code = -1;    // 0..255, or 128+N for signal N
+    std::string out, err;  // standard output and standard error
 };
-
 struct RunOptions {
     std::map<std::string, std::string> set_env;  // added or replaced
     std::vector<std::string> unset_env;
-    std::string cwd;                  // "" = the test's own
-    std::string stdin_path;           // "" = /dev/null
-    bool prepend_bin_to_path = true;  // build/bin first on PATH (the stand-in loader)
-    std::string argv0;                // "" = the program's path
+    // When "": the test's own directory, /dev/null, captured into RunResult::err.
+    std::string cwd, stdin_path, stderr_path;
 };
-
-// Runs a program (a path) with arguments, capturing standard output and
-// standard error. The tool runs under ZR7_TOOL_WRAPPER when that is set
-// (`make memcheck`: valgrind and its options).
+// Runs a program (a path) with build/bin first on PATH and its output captured.
+// The words of ZR7_TOOL_WRAPPER (a memory checker, say) go before the tool.
 RunResult run(const std::string& program, const std::vector<std::string>& args,
               const RunOptions& options = {});
+inline std::string bin_dir() {
+    return ZR7_BIN_DIR;
+}
+inline std::string tool_path() {
+    return bin_dir() + "/zr7inst";
+}
 
-// The built tool and its directory.
-std::string tool_path();
-std::string bin_dir();
-
-// A sample server installation and source image in a scratch directory:
-//   home/config/.ConfigData/kmsenv   server SRV1, architecture lx8266, ip.pipe 1918
-//   home/tables/SRV1/{VXAENV,ATTRLIB,RKDSCATL,TECLIB}
-//   home/tables/cicatrsq/{ATTRLIB,RKDSCATL,TECLIB,SQLLIB}
-//   home/lx8266/ms/{lib,bin}, home/logs
-//   image/MSRV/{ATTRLIB,RKDSCATL,TECLIB,SQLLIB} and image/MSRV/lx8266/{TABLE,...}
+// A server home (kmsenv: server SRV1, arch lx8266, ip.pipe port 1918; VXAENV; table
+// directories; ms/lib, ms/bin, logs) and an image with a file wherever the tool reads.
 struct SampleInstall {
     TempDir root;
-    std::string home;   // without trailing "/"
-    std::string image;  // without trailing "/"
-    std::string server = "SRV1";
-    std::string arch = "lx8266";
-    std::string vxaenv;  // path of VXAENV
-
+    std::string home = root / "home", image = root / "image";  // without trailing "/"
+    std::string server = "SRV1", arch = "lx8266", vxaenv = tables() + "/VXAENV";
     SampleInstall();
     std::string tables() const { return home + "/tables/" + server; }
     std::string cicatrsq() const { return home + "/tables/cicatrsq"; }
 };
+inline const char* const kSampleVxaenv =  // what SampleInstall puts in VXAENV
+    "# server environment\nKDS_START=1\nKDS_RUN=KDSMAIN;KDSTRACE\nCT_CMSLIST=IP.PIPE:#127.0.0.1\n";
 
-// The content SampleInstall gives VXAENV.
-extern const char* const kSampleVxaenv;
+template <typename Body>
+std::string capture_stdout(Body body) {
+    ::testing::internal::CaptureStdout();
+    body();
+    return ::testing::internal::GetCapturedStdout();
+}
+// A trace line is "(<stamp> pid <n> <unit>:<line>) <message>\n".
+inline bool has_trace_line(const std::string& output, const std::string& message) {
+    return output.find(") " + message + "\n") != std::string::npos;
+}
 
 }  // namespace zr7test

@@ -1,0 +1,198 @@
+// Whole installing runs on the sample with the stand-in loader: what lands
+// where with which content, how each failure ends the run, what becomes of
+// the environment file, and the progress display on a terminal.
+#include <fcntl.h>
+#include <unistd.h>
+
+#include <filesystem>
+#include <regex>
+
+#include "e2e/e2e.h"
+
+namespace zr7test {
+namespace {
+
+namespace fs = std::filesystem;
+using S = const SampleInstall&;
+
+TEST(Install, EveryFileLandsInPlaceWithItsContent) {
+    SampleInstall s;
+    const std::string t = s.tables() + "/", c = s.cicatrsq() + "/", a = s.image + "/MSRV/lx8266/";
+    // clang-format off
+    const std::pair<std::string, std::string> before[] = {  // in place, and more in the image
+        {t + "table.dat", "old\n"}, {t + "text.txt", "old\n"}, {t + "keep.cfg", "local\n"},
+        {t + "keep.txt", "local\r\n"}, {a + "TABLE_PRESERVE/new.cfg", "new\r\n"},
+        {a + "TABLE_PRESERVE_TXT/new.txt", "a\r\nb\r\n"}};
+    const std::pair<std::string, std::string> after[] = {
+        // Flat copies lose their CRs, in both table directories.
+        {t + "ATTRLIB/kzr.atr", "name kzr\nattr one\n"}, {t + "TECLIB/kzr.baroc", "event\n"},
+        {c + "ATTRLIB/kzr.atr", "name kzr\nattr one\n"}, {c + "TECLIB/kzr.baroc", "event\n"},
+        {t + "RKDSCATL/kzr.cat", "catalog\n"}, {c + "RKDSCATL/kzr.cat", "catalog\n"},
+        {c + "SQLLIB/kzr_b.sql", "INSERT INTO T VALUES (3);\n"},
+        // TABLE replaces, TABLE_PRESERVE only adds; both keep the bytes.
+        {t + "table.dat", "table\r\n"}, {t + "sub/deeper/nested.dat", "nested\r\n"},
+        {t + "keep.cfg", "local\n"}, {t + "new.cfg", "new\r\n"},
+        // TABLE_TXT replaces, TABLE_PRESERVE_TXT only adds; both remove CRs.
+        {t + "text.txt", "line one\nline two\n"}, {t + "keep.txt", "local\r\n"},
+        {t + "new.txt", "a\nb\n"}, {s.vxaenv, kSampleVxaenv},  // VXAENV: no -c, no -m
+        // The TECLIB of the TABLE tree is flat-copied after the trees.
+        {t + "TECLIB/kzr_table.baroc", "table event\n"},
+        {c + "TECLIB/kzr_table.baroc", "table event\n"},
+        // lib and bin replace and keep the bytes.
+        {s.home + "/lx8266/ms/lib/libkzr.so", "ELF\r\nbinary\r\n"},
+        {s.home + "/lx8266/ms/bin/kzragent", "#!/bin/sh\r\nexit 0\r\n"}};
+    // clang-format on
+    for (const auto& [path, content] : before)
+        write_file(path, content);
+    const RunResult r = install(s);
+    ASSERT_EQ(std::to_string(r.exit_code) + r.out + r.err, "0Calling go\nExiting with rc <0>\n");
+    for (const auto& [path, content] : after)
+        EXPECT_EQ(read_file(path), content) << path;
+    EXPECT_EQ(::access((s.home + "/lx8266/ms/bin/kzragent").c_str(), X_OK), 0);
+    EXPECT_FALSE(exists(t + "SQLLIB") || exists(c + "table.dat"));
+}
+
+// How a run ends: what came before stays done, what comes after is not done
+// ("": nothing to look at). Through the relaunch the first invocation ends
+// with the same status, and a second run's output follows the first's in the log.
+TEST(Install, EachOutcomeEndsTheRunWithItsStatus) {
+    const std::string srv = "tables/SRV1/", cic = "tables/cicatrsq/", cat = cic + "qdsload.catalog";
+    const std::string atr = srv + "ATTRLIB/kzr.atr";
+    const auto none = [](S) {};
+    // clang-format off
+    const struct { void (*prepare)(S); std::vector<std::string> flags; const char* fail; int rc;
+                   std::string done, not_done; } cases[] = {
+        {none, {}, "", 0, cat, ""},
+        {none, {"-e"}, "", 0, atr, cat},
+        // The SQL files as a copy-only run leaves them.
+        {[](S s) { fs::copy(s.image + "/MSRV/SQLLIB", s.cicatrsq() + "/SQLLIB"); }, {"-s"}, "", 0,
+         cat, atr},
+        {none, {"-e", "-s"}, "", 0, "", atr},  // seeding would fail: no copies
+        {[](S s) { remove_tree(s.home + "/config"); }, {}, "", 2, "", atr},
+        {[](S s) { remove_tree(s.tables() + "/ATTRLIB"); }, {}, "", -5, "",
+         srv + "RKDSCATL/kzr.cat"},
+        {none, {}, "kzr_a.sql", -6, cic + "TECLIB/kzr_table.baroc", ""},
+        {[](S s) { remove_tree(s.image + "/MSRV/SQLLIB"); }, {}, "", -7,
+         cic + "TECLIB/kzr_table.baroc", cat},
+        // A link back up the walked tree is refused, not followed without end.
+        {[](S s) { ::symlink("..", (s.image + "/MSRV/lx8266/TABLE/sub/loop").c_str()); }, {}, "",
+         -5, atr, srv + "sub/loop"}};
+    // clang-format on
+    for (const auto& c : cases) {
+        const std::string line = "\nExiting with rc <" + std::to_string(c.rc) + ">\n";
+        SampleInstall s, relaunched;
+        c.prepare(s);
+        c.prepare(relaunched);
+        RunOptions options;
+        options.set_env["QDSLOAD_FAIL"] = c.fail;
+        const RunResult r = install(s, c.flags, options);
+        EXPECT_EQ(r.exit_code, c.rc & 0xFF) << r.out;
+        EXPECT_TRUE(ends_with("\n" + r.out, line)) << r.out;
+        EXPECT_TRUE(exists(s.home + "/" + c.done)) << c.done;
+        EXPECT_FALSE(!c.not_done.empty() && exists(s.home + "/" + c.not_done)) << c.not_done;
+        std::vector<std::string> args = c.flags;
+        args.insert(args.end(), {"-h", relaunched.home, relaunched.image});
+        for (int run = 0; run < 2; ++run)
+            EXPECT_EQ(tool(args, options).exit_code, c.rc & 0xFF);
+        const std::string log = read_file(relaunched.home + "/logs/qsdinst.log");
+        EXPECT_NE(log.find(line, log.find(line) + 1), std::string::npos) << log;
+    }
+}
+
+// The loader runs in the order the directory gives the files; the second of
+// three fails, so the first is seeded and the third is not tried.
+TEST(Install, LoaderFailureStopsTheSeeding) {
+    SampleInstall s;
+    const std::string sqllib = s.image + "/MSRV/SQLLIB", record = s.root.path() + "/";
+    write_file(sqllib + "/kzr_c.sql", "INSERT INTO T VALUES (4);\n");
+    std::vector<std::string> order;
+    for (const auto& entry : fs::directory_iterator(sqllib))
+        order.push_back(entry.path().filename());
+    RunOptions options;
+    options.set_env = {{"QDSLOAD_FAIL", order[1]}, {"QDSLOAD_RECORD", s.root.path()}};
+    EXPECT_EQ(install(s, {}, options).exit_code, 250);
+    const std::string catalog = read_file(s.cicatrsq() + "/qdsload.catalog");
+    EXPECT_NE(catalog.find(" loaded <" + order[0] + "> statements "), std::string::npos) << catalog;
+    EXPECT_FALSE(exists(record + order[2] + ".rsp"));
+    EXPECT_EQ(read_file(record + order[0] + ".rsp"),
+              "ip.pipe\n" + read_file("/proc/sys/kernel/hostname") + "1918\n" + order[0] + "\nend");
+    EXPECT_EQ(read_file(record + order[0] + ".env"),
+              "KDC_FAMILIES=PORT:1918 ip.pipe USE:Y\nSQLLIB=" + s.cicatrsq() +
+                  "/SQLLIB\nVXA_TRC1=ERROR\nstdin mode 0600\n");
+}
+
+TEST(Vxaenv, SettingsAndModuleRewriteItWithABackup) {
+    SampleInstall s;
+    ASSERT_EQ(install(s, {"-e", "-c", "kds_start=2", "-c", "NEW=v", "-m", "KZR"}).exit_code, 0);
+    EXPECT_EQ(read_file(s.vxaenv),
+              "# server environment\nKDS_START=2\nKDS_RUN=KDSMAIN;KDSTRACE;KZR\n"
+              "CT_CMSLIST=IP.PIPE:#127.0.0.1\nNEW=v\n");
+    const std::vector<std::string> backups = list_dir(s.tables() + "/.archive");
+    ASSERT_EQ(backups.size(), 1u);
+    EXPECT_TRUE(std::regex_match(backups[0], std::regex("VXAENV_[0-9]+"))) << backups[0];
+    EXPECT_EQ(read_file(s.tables() + "/.archive/" + backups[0]), kSampleVxaenv);
+    for (const std::string& name : list_dir(s.tables()))
+        EXPECT_EQ(name.find("VXAENV."), std::string::npos) << "scratch file left: " << name;
+}
+
+// The sample's files are far below the limit on file size, the new VXAENV above.
+TEST(Vxaenv, AFullDiskGives248AndLeavesItWhole) {
+    SampleInstall s;
+    const std::string big = "B=" + std::string(9000, 'v');
+    const std::string limit = "ulimit -f 8; trap '' XFSZ; exec \"$0\" \"$@\"";
+    EXPECT_EQ(install(s, {"-e", "-m", "KZR", "-c", big}, {}, limit).exit_code, 248);
+    EXPECT_EQ(read_file(s.vxaenv), kSampleVxaenv);
+    EXPECT_FALSE(exists(s.tables() + "/.archive"));
+}
+
+// The installs take turns on the server, so none of the updates is lost.
+TEST(Vxaenv, SixInstallsAtOnceEachAddTheirModule) {
+    SampleInstall s;
+    const std::string six =
+        "for m in 0 1 2 3 4 5; do \"$0\" -m MOD$m \"$@\" >/dev/null || echo $m: $? & done; wait";
+    EXPECT_EQ(install(s, {"-e"}, {}, six).out, "");
+    const std::string vxaenv = read_file(s.vxaenv);
+    for (int i = 0; i < 6; ++i)
+        EXPECT_NE(vxaenv.find(";MOD" + std::to_string(i)), std::string::npos) << vxaenv;
+}
+
+// On a terminal standard error carries the progress line and the summary;
+// elsewhere none of it, and standard output and the log are the same.
+TEST(Progress, OnlyOnATerminal) {
+    SampleInstall on_tty, plain;
+    const int master = ::posix_openpt(O_RDWR | O_NOCTTY | O_CLOEXEC);
+    ASSERT_TRUE(master >= 0 && ::grantpt(master) == 0 && ::unlockpt(master) == 0);
+    RunOptions on, off;  // in each sample's root: the same command lines
+    on.cwd = on_tty.root.path();
+    on.stderr_path = ::ptsname(master);
+    const int slave = ::open(on.stderr_path.c_str(), O_RDWR | O_NOCTTY | O_CLOEXEC);
+    off.cwd = plain.root.path();
+    const std::vector<std::string> args = {"-h", "home", "-c", "zr7demo=1", "-m", "kzr", "image"};
+    const RunResult t = tool(args, on), r = tool(args, off);
+    // Read to the end, when no one holds the terminal (the test too, lest a run that
+    // never opened it keep the read waiting). The terminal made each line end CR LF.
+    ::close(slave);
+    std::string tty;
+    char buffer[4096];
+    for (ssize_t got; (got = ::read(master, buffer, sizeof buffer)) > 0;)
+        tty.append(buffer, static_cast<std::size_t>(got));
+    ::close(master);
+    EXPECT_EQ(t.exit_code, 0);
+    EXPECT_EQ(tty.find("\r[1/17] copy ATTRLIB | files: 0 copied, 0 seeded"), 0u) << tty;
+    // The progress line is rewritten in place, then blanked for the summary.
+    EXPECT_TRUE(std::regex_match(
+        tty, std::regex("[^\n]*\r *\rzr7inst: installation done\r\n"
+                        "  files copied: [1-9][0-9]*\r\n  files seeded: 2\r\n"
+                        "  VXAENV: changed, backup [^\n]*/\\.archive/VXAENV_[0-9]+\r\n")))
+        << tty;
+    EXPECT_EQ(r.err, "");
+    const auto same = [](const std::string& text) {
+        return std::regex_replace(text, std::regex("[0-9]+|backup\\.\\w+"), "#");
+    };
+    EXPECT_EQ(same(t.out), same(r.out));
+    EXPECT_EQ(same(read_file(on_tty.home + "/logs/qsdinst.log")),
+              same(read_file(plain.home + "/logs/qsdinst.log")));
+}
+
+}  // namespace
+}  // namespace zr7test
