@@ -8,7 +8,7 @@ FUZZ_SECONDS ?= 60
 SANITIZER_OPTIONS = ASAN_OPTIONS=detect_leaks=1:abort_on_error=0 \
 	UBSAN_OPTIONS=print_stacktrace=1:halt_on_error=1
 
-.PHONY: all build test soak fuzz memcheck demo format clean
+.PHONY: all build test soak fuzz memcheck demo bench format clean
 
 all: build
 
@@ -59,8 +59,19 @@ memcheck:
 demo: build
 	examples/run-demo.sh $(BUILD_REL)
 
+# The benchmark: the tool against the shell way and a plain copy on three
+# sizes of synthetic installation, and the limits (a very deep tree, a very
+# large directory). Writes bench/RESULTS.md; the full run takes half an hour
+# or more on two cores. BENCH_ARGS passes options to the runner, e.g.
+#   make bench BENCH_ARGS="--sizes small --rounds 3 --no-limits"
+BENCH_ARGS ?=
+bench:
+	cmake -S . -B $(BUILD_REL) -G Ninja -DCMAKE_BUILD_TYPE=RelWithDebInfo -DZR7_TESTS=OFF
+	cmake --build $(BUILD_REL) -j $(JOBS)
+	$(BUILD_REL)/bin/zr7bench_run $(BENCH_ARGS)
+
 format:
-	find qsd tests fuzz tools -name '*.cpp' -o -name '*.h' | xargs clang-format -i
+	find qsd tests fuzz tools bench -name '*.cpp' -o -name '*.h' | xargs clang-format -i
 
 clean:
 	rm -rf build

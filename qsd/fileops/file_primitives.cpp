@@ -23,7 +23,10 @@ int InstallUtil::removeReadOnly(const char* path) {
     struct stat st {};
     if (::stat(path, &st) != 0)
         return 0;
-    (void)::chmod(path, (st.st_mode & 07777) | S_IWUSR);
+    // Most copies arrive writable already: their mode would not change, so
+    // the call that would set it again is left out.
+    if ((st.st_mode & S_IWUSR) == 0)
+        (void)::chmod(path, (st.st_mode & 07777) | S_IWUSR);
     return 0;
 }
 

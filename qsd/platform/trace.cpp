@@ -1,5 +1,6 @@
 #include "qsd/platform/trace.h"
 
+#include <pthread.h>
 #include <unistd.h>
 
 #include <cstdarg>
@@ -115,26 +116,58 @@ int TraceScope::exit(int line, int status) {
 
 namespace {
 
-void write_line(const TRC1_Unit* unit, int line, const std::string& message) {
-    char stamp[32] = "";
-    std::time_t now = std::time(nullptr);
-    struct tm parts {};
-    if (localtime_r(&now, &parts) != nullptr) {
-        std::strftime(stamp, sizeof stamp, "%Y-%m-%d %H:%M:%S", &parts);
+// The process id, asked once; a forked child asks again.
+long g_pid = 0;
+
+void forget_pid() {
+    g_pid = 0;
+}
+
+long current_pid() {
+    if (g_pid == 0) {
+        static const bool registered = ::pthread_atfork(nullptr, nullptr, forget_pid) == 0;
+        (void)registered;
+        g_pid = static_cast<long>(::getpid());
     }
-    std::string out = "(";
-    out += stamp;
-    out += " pid ";
-    out += std::to_string(static_cast<long>(getpid()));
-    out += ' ';
+    return g_pid;
+}
+
+// With every class on, the installing run writes some ten lines for each
+// file it copies. The head of a line, "(2026-12-06 18:30:32 pid 4242 ",
+// changes at most once a second, so it is kept and made again only when the
+// second (or the process) has changed, and the line is put together in one
+// reused buffer and handed to the stream whole: one write per line, flushed
+// at once, so that it stays in order with what the programs the tool starts
+// write to the same file.
+void write_line(const TRC1_Unit* unit, int line, const char* message, std::size_t length) {
+    static std::time_t head_second = -1;
+    static long head_pid = -1;
+    static std::string head;
+    static std::string out;
+    const std::time_t now = std::time(nullptr);
+    const long pid = current_pid();
+    if (now != head_second || pid != head_pid) {
+        char stamp[32] = "";
+        struct tm parts {};
+        if (localtime_r(&now, &parts) != nullptr)
+            std::strftime(stamp, sizeof stamp, "%Y-%m-%d %H:%M:%S", &parts);
+        head = std::string("(") + stamp + " pid " + std::to_string(pid) + " ";
+        head_second = now;
+        head_pid = pid;
+    }
+    char number[16];
+    const int digits = std::snprintf(number, sizeof number, ":%d) ", line);
+    out.assign(head);
     out += unit->name;
-    out += ':';
-    out += std::to_string(line);
-    out += ") ";
-    out += message;
+    out.append(number, digits > 0 ? static_cast<std::size_t>(digits) : 0);
+    out.append(message, length);
     out += '\n';
     std::fwrite(out.data(), 1, out.size(), stdout);
     std::fflush(stdout);
+}
+
+void write_line(const TRC1_Unit* unit, int line, const std::string& message) {
+    write_line(unit, line, message.data(), message.size());
 }
 
 }  // namespace
@@ -170,20 +203,25 @@ void TRC1_Event(TRC1_Unit* unit, int line, int kind, int status) {
 }
 
 void TRC1_Printf(TRC1_Unit* unit, int line, const char* format, ...) {
+    // Formatted once into a buffer on the stack; only a longer line is
+    // formatted a second time, into one of its size.
+    char buffer[1024];
     va_list args;
     va_start(args, format);
     va_list again;
     va_copy(again, args);
-    int size = std::vsnprintf(nullptr, 0, format, args);
+    const int size = std::vsnprintf(buffer, sizeof buffer, format, args);
     va_end(args);
-    std::string message;
-    if (size > 0) {
-        std::vector<char> buffer(static_cast<std::size_t>(size) + 1);
-        std::vsnprintf(buffer.data(), buffer.size(), format, again);
-        message.assign(buffer.data(), static_cast<std::size_t>(size));
+    if (size <= 0) {
+        zr7::write_line(unit, line, "", 0);
+    } else if (static_cast<std::size_t>(size) < sizeof buffer) {
+        zr7::write_line(unit, line, buffer, static_cast<std::size_t>(size));
+    } else {
+        std::vector<char> larger(static_cast<std::size_t>(size) + 1);
+        std::vsnprintf(larger.data(), larger.size(), format, again);
+        zr7::write_line(unit, line, larger.data(), static_cast<std::size_t>(size));
     }
     va_end(again);
-    zr7::write_line(unit, line, message);
 }
 
 const char* PLT1_GetEnv(const char* name, const char* /*unused*/) {
