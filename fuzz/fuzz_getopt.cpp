@@ -25,9 +25,9 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
         ZR7_FUZZ_CHECK(options.index <= argc);
         if (letter == '?')
             return 0;  // the usage text ends the real run here
-        const char* spec = std::strchr(zr7::kOptionString, letter);
-        ZR7_FUZZ_CHECK(letter != ':' && spec != nullptr);
-        ZR7_FUZZ_CHECK((spec[1] == ':') == (options.argument != nullptr));
+        const char* letter_entry = std::strchr(zr7::kOptionString, letter);
+        ZR7_FUZZ_CHECK(letter != ':' && letter_entry != nullptr);
+        ZR7_FUZZ_CHECK((letter_entry[1] == ':') == (options.argument != nullptr));
         if (options.argument != nullptr) {
             bool inside = false;
             for (int i = 1; i < options.index; ++i) {

@@ -55,19 +55,18 @@ int copy_into_place(const char* src, const char* dst, bool fix_cr) {
         return -5;
     ::close(fd);
 
-    zr7::ProcessSpec spec;
+    zr7::ProcessSpec job;
     if (fix_cr) {
-        spec.program = "tr";
-        spec.args = {"-d", "\r"};
-        spec.stdin_path = src;
-        spec.stdout_path = scratch;
-        spec.stdout_mode = zr7::OutputMode::kTruncate;
+        job.program = "tr";
+        job.args = {"-d", "\r"};
+        job.stdin_path = src;
+        job.stdout_path = scratch;
+        job.stdout_mode = zr7::OutputMode::kTruncate;
     } else {
-        spec.program = "cp";
-        spec.args = {"-f", "--", src, scratch};
+        job.program = "cp";
+        job.args = {"-f", "--", src, scratch};
     }
-    const bool done = zr7::run_process(spec) == 0 &&
-                      give_attributes(scratch, target, src, fix_cr) &&
+    const bool done = zr7::run_process(job) == 0 && give_attributes(scratch, target, src, fix_cr) &&
                       ::rename(scratch.c_str(), target.c_str()) == 0;
     if (!done)
         ::unlink(scratch.c_str());

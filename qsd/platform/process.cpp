@@ -76,18 +76,18 @@ std::string find_on_path(const std::string& program) {
     return found;
 }
 
-int run_process(const ProcessSpec& spec) {
-    const std::string path = find_on_path(spec.program);
+int run_process(const ProcessSpec& job) {
+    const std::string path = find_on_path(job.program);
     if (path.empty())
         return kRunNotStarted;
 
     // The input is opened, and checked to be readable data, before the output
     // is touched: a directory opens for reading but yields nothing, and would
     // otherwise cost an existing output its content.
-    FdGuard in_fd(spec.stdin_path.empty() ? -1
-                                          : ::open(spec.stdin_path.c_str(), O_RDONLY | O_CLOEXEC));
+    FdGuard in_fd(job.stdin_path.empty() ? -1
+                                         : ::open(job.stdin_path.c_str(), O_RDONLY | O_CLOEXEC));
     struct stat in_st {};
-    if (!spec.stdin_path.empty() &&
+    if (!job.stdin_path.empty() &&
         (in_fd.get() < 0 || ::fstat(in_fd.get(), &in_st) != 0 || S_ISDIR(in_st.st_mode))) {
         return kRunStdinFailed;
     }
@@ -95,27 +95,27 @@ int run_process(const ProcessSpec& spec) {
     // The output is truncated only once it is known not to be the input file
     // itself, which truncation would destroy before the program read it.
     int out_flags = O_WRONLY | O_CREAT | O_CLOEXEC;
-    if (spec.stdout_mode == OutputMode::kAppend)
+    if (job.stdout_mode == OutputMode::kAppend)
         out_flags |= O_APPEND;
-    FdGuard out_fd(spec.stdout_mode == OutputMode::kInherit
+    FdGuard out_fd(job.stdout_mode == OutputMode::kInherit
                        ? -1
-                       : ::open(spec.stdout_path.c_str(), out_flags, 0666));
-    if (spec.stdout_mode != OutputMode::kInherit) {
+                       : ::open(job.stdout_path.c_str(), out_flags, 0666));
+    if (job.stdout_mode != OutputMode::kInherit) {
         struct stat out_st {};
         if (out_fd.get() < 0 || ::fstat(out_fd.get(), &out_st) != 0)
             return kRunStdoutFailed;
         if (in_fd.get() >= 0 && in_st.st_dev == out_st.st_dev && in_st.st_ino == out_st.st_ino)
             return kRunStdoutFailed;
-        if (spec.stdout_mode == OutputMode::kTruncate && S_ISREG(out_st.st_mode) &&
+        if (job.stdout_mode == OutputMode::kTruncate && S_ISREG(out_st.st_mode) &&
             ::ftruncate(out_fd.get(), 0) != 0) {
             return kRunStdoutFailed;
         }
     }
 
     std::vector<char*> argv;
-    argv.reserve(spec.args.size() + 2);
-    argv.push_back(const_cast<char*>(spec.program.c_str()));
-    for (const std::string& arg : spec.args)
+    argv.reserve(job.args.size() + 2);
+    argv.push_back(const_cast<char*>(job.program.c_str()));
+    for (const std::string& arg : job.args)
         argv.push_back(const_cast<char*>(arg.c_str()));
     argv.push_back(nullptr);
 

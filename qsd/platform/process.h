@@ -33,7 +33,7 @@ constexpr int kRunStdoutFailed = -3;  // output file could not be opened, or is 
 // untouched, and an output that is the input file itself is refused before it
 // is truncated. Standard output is flushed first so that the tool's own lines
 // and the child's stay in order.
-int run_process(const ProcessSpec& spec);
+int run_process(const ProcessSpec& job);
 
 // Full path of `program` on PATH ("" when not found). The answer is cached
 // per program name and PATH value: a run starts the same few programs
