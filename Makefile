@@ -1,9 +1,14 @@
 # Front door for developers and CI. Every target builds in a folder of its own.
 BUILD_TEST ?= build/asan
 BUILD_REL ?= build/release
+BUILD_FUZZ ?= build/fuzz
+BUILD_MEMCHECK ?= build/memcheck
 JOBS ?= $(shell nproc)
+FUZZ_SECONDS ?= 60
+SANITIZER_OPTIONS = ASAN_OPTIONS=detect_leaks=1:abort_on_error=0 \
+	UBSAN_OPTIONS=print_stacktrace=1:halt_on_error=1
 
-.PHONY: all build test demo bench format clean
+.PHONY: all build test soak fuzz memcheck demo bench format clean
 
 all: build
 
@@ -16,8 +21,38 @@ build:
 test:
 	cmake -S . -B $(BUILD_TEST) -G Ninja -DCMAKE_BUILD_TYPE=Debug -DZR7_SANITIZE=ON
 	cmake --build $(BUILD_TEST) -j $(JOBS)
-	ASAN_OPTIONS=detect_leaks=1:abort_on_error=0 UBSAN_OPTIONS=print_stacktrace=1:halt_on_error=1 \
-		ctest --test-dir $(BUILD_TEST) --output-on-failure -j $(JOBS)
+	$(SANITIZER_OPTIONS) ctest --test-dir $(BUILD_TEST) --output-on-failure -j $(JOBS)
+
+# The robustness tests in their long variants (every kill, the whole wide
+# directory), run straight from the test program: they outlast a ctest time
+# limit.
+soak:
+	cmake -S . -B $(BUILD_TEST) -G Ninja -DCMAKE_BUILD_TYPE=Debug -DZR7_SANITIZE=ON
+	cmake --build $(BUILD_TEST) -j $(JOBS)
+	ZR7_SOAK=1 $(SANITIZER_OPTIONS) $(BUILD_TEST)/bin/test_robustness
+
+# The fuzz targets, built with clang apart from the main build, each run for
+# FUZZ_SECONDS seconds.
+fuzz:
+	CC=clang CXX=clang++ cmake -S fuzz -B $(BUILD_FUZZ) -G Ninja -DCMAKE_BUILD_TYPE=Debug
+	cmake --build $(BUILD_FUZZ) -j $(JOBS)
+	FUZZ_SECONDS=$(FUZZ_SECONDS) fuzz/run.sh $(BUILD_FUZZ)
+
+# The end-to-end tests with every run of the tool (the relaunched one
+# included) under valgrind's memcheck, in a build without sanitizers. Any
+# error or definite leak fails the run of the tool; the reports stay in
+# $(BUILD_MEMCHECK)/valgrind.
+MEMCHECK = $(shell command -v valgrind) -q --error-exitcode=99 --leak-check=full \
+	--errors-for-leak-kinds=definite --trace-children=yes \
+	--trace-children-skip=*/cp,*/tr,*/qdsload --log-file=$(CURDIR)/$(BUILD_MEMCHECK)/valgrind/%p.log
+memcheck:
+	cmake -S . -B $(BUILD_MEMCHECK) -G Ninja -DCMAKE_BUILD_TYPE=Debug -DZR7_SANITIZE=OFF
+	cmake --build $(BUILD_MEMCHECK) -j $(JOBS) --target test_e2e
+	rm -rf $(BUILD_MEMCHECK)/valgrind && mkdir -p $(BUILD_MEMCHECK)/valgrind
+	ZR7_TOOL_WRAPPER="$(MEMCHECK)" $(BUILD_MEMCHECK)/bin/test_e2e
+	@reports=$$(find $(BUILD_MEMCHECK)/valgrind -type f -size +0c); \
+	if [ -n "$$reports" ]; then cat $$reports; echo "memcheck: errors reported"; exit 1; fi; \
+	echo "memcheck: $$(ls $(BUILD_MEMCHECK)/valgrind | wc -l) runs of the tool, no error, no leak"
 
 # A real installation of the sample under examples/ into a scratch copy in
 # $(BUILD_REL)/demo, then what it did.
@@ -36,7 +71,7 @@ bench:
 	$(BUILD_REL)/bin/zr7bench_run $(BENCH_ARGS)
 
 format:
-	find qsd tests bench -name '*.cpp' -o -name '*.h' | xargs clang-format -i
+	find qsd tests fuzz tools bench -name '*.cpp' -o -name '*.h' | xargs clang-format -i
 
 clean:
 	rm -rf build

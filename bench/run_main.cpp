@@ -407,11 +407,11 @@ std::string plot(const Options& o, const Bench& b, const Report& report) {
       << "' using 1:2 with linespoints title 'A tool', '" << data
       << "' using 1:4 with linespoints title 'C floor'\n";
     g.close();
-    SpawnSpec spec;
-    spec.argv = {gnuplot, script};
-    spec.env = b.env;
-    spec.stderr_path = o.work + "/plot.err";
-    if (spawn_and_wait(spec).exit_code != 0) {
+    SpawnSpec job;
+    job.argv = {gnuplot, script};
+    job.env = b.env;
+    job.stderr_path = o.work + "/plot.err";
+    if (spawn_and_wait(job).exit_code != 0) {
         std::fprintf(stderr, "gnuplot failed: no plot (see %s/plot.err)\n", o.work.c_str());
         return "";
     }

@@ -32,15 +32,15 @@ std::string slurp(const std::string& path) {
 Sample run_tool(const Bench& bench, const Case& c) {
     const std::string probe_file = bench.work + "/" + c.label + ".rusage";
     ::unlink(probe_file.c_str());
-    SpawnSpec spec;
-    spec.argv = {
+    SpawnSpec job;
+    job.argv = {
         bench.bin_dir + "/zr7inst", "-h", c.home, "-c", kBenchSetting, "-m", kBenchModule, c.image};
-    spec.env = bench.env;
-    spec.env.push_back("LD_PRELOAD=" + bench.bin_dir + "/zr7bench_probe.so");
-    spec.env.push_back("ZR7BENCH_RUSAGE=" + probe_file);
-    spec.stdout_path = bench.work + "/" + c.label + ".A.out";
-    spec.stderr_path = bench.work + "/" + c.label + ".A.err";
-    Sample s = from_spawn(spawn_and_wait(spec));
+    job.env = bench.env;
+    job.env.push_back("LD_PRELOAD=" + bench.bin_dir + "/zr7bench_probe.so");
+    job.env.push_back("ZR7BENCH_RUSAGE=" + probe_file);
+    job.stdout_path = bench.work + "/" + c.label + ".A.out";
+    job.stderr_path = bench.work + "/" + c.label + ".A.err";
+    Sample s = from_spawn(spawn_and_wait(job));
     const ToolUsage usage = combine_probe_lines(slurp(probe_file));
     if (usage.installers > 0) {
         s.tool_cpu_s = static_cast<double>(usage.self_us) / 1e6;
@@ -51,13 +51,13 @@ Sample run_tool(const Bench& bench, const Case& c) {
 }
 
 Sample run_shell_way(const Bench& bench, const Case& c) {
-    SpawnSpec spec;
-    spec.argv = {bench.bash, bench.script, c.image,       c.home,
-                 c.server,   c.arch,       kBenchSetting, kBenchModule};
-    spec.env = bench.env;
-    spec.stdout_path = bench.work + "/" + c.label + ".B.out";
-    spec.stderr_path = bench.work + "/" + c.label + ".B.err";
-    return from_spawn(spawn_and_wait(spec));
+    SpawnSpec job;
+    job.argv = {bench.bash, bench.script, c.image,       c.home,
+                c.server,   c.arch,       kBenchSetting, kBenchModule};
+    job.env = bench.env;
+    job.stdout_path = bench.work + "/" + c.label + ".B.out";
+    job.stderr_path = bench.work + "/" + c.label + ".B.err";
+    return from_spawn(spawn_and_wait(job));
 }
 
 Sample run_floor(const Bench& bench, const Case& c) {
@@ -90,11 +90,11 @@ Sample run_floor(const Bench& bench, const Case& c) {
     };
     Sample total;
     for (const Step& step : steps) {
-        SpawnSpec spec;
-        spec.argv = {bench.cp, step.keep_existing ? "-an" : "-a", step.from + "/.", step.to};
-        spec.env = bench.env;
-        spec.stderr_path = bench.work + "/" + c.label + ".C.err";
-        const Sample s = from_spawn(spawn_and_wait(spec));
+        SpawnSpec job;
+        job.argv = {bench.cp, step.keep_existing ? "-an" : "-a", step.from + "/.", step.to};
+        job.env = bench.env;
+        job.stderr_path = bench.work + "/" + c.label + ".C.err";
+        const Sample s = from_spawn(spawn_and_wait(job));
         total.wall_s += s.wall_s;
         total.cpu_s += s.cpu_s;
         if (total.exit_code == 0)

@@ -11,29 +11,29 @@
 
 namespace zr7bench {
 
-SpawnResult spawn_and_wait(const SpawnSpec& spec) {
+SpawnResult spawn_and_wait(const SpawnSpec& job) {
     SpawnResult result;
     std::vector<char*> argv;
-    for (const std::string& a : spec.argv)
+    for (const std::string& a : job.argv)
         argv.push_back(const_cast<char*>(a.c_str()));
     argv.push_back(nullptr);
     std::vector<char*> envp;
-    for (const std::string& e : spec.env)
+    for (const std::string& e : job.env)
         envp.push_back(const_cast<char*>(e.c_str()));
     envp.push_back(nullptr);
 
     posix_spawn_file_actions_t actions;
     posix_spawn_file_actions_init(&actions);
     posix_spawn_file_actions_addopen(&actions, 0, "/dev/null", O_RDONLY, 0);
-    const std::string out = spec.stdout_path.empty() ? "/dev/null" : spec.stdout_path;
-    const std::string err = spec.stderr_path.empty() ? "/dev/null" : spec.stderr_path;
+    const std::string out = job.stdout_path.empty() ? "/dev/null" : job.stdout_path;
+    const std::string err = job.stderr_path.empty() ? "/dev/null" : job.stderr_path;
     posix_spawn_file_actions_addopen(&actions, 1, out.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0644);
     posix_spawn_file_actions_addopen(&actions, 2, err.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0644);
 
     const auto start = std::chrono::steady_clock::now();
     pid_t pid = 0;
     const int rc =
-        posix_spawn(&pid, spec.argv.at(0).c_str(), &actions, nullptr, argv.data(), envp.data());
+        posix_spawn(&pid, job.argv.at(0).c_str(), &actions, nullptr, argv.data(), envp.data());
     posix_spawn_file_actions_destroy(&actions);
     if (rc != 0)
         return result;

@@ -19,7 +19,7 @@ struct SpawnResult {
     double cpu_s = 0;  // user and system time of the process and every descendant it waited for
 };
 
-SpawnResult spawn_and_wait(const SpawnSpec& spec);
+SpawnResult spawn_and_wait(const SpawnSpec& job);
 
 // The full path of a program on PATH, "" when not found.
 std::string find_program(const std::string& name, const std::string& path_value);

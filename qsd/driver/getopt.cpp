@@ -14,10 +14,10 @@ char GetOpt::next() {
         return 0;
     }
     const char letter = a[1];
-    const char* spec = letter == ':' ? nullptr : std::strchr(option_string, letter);
-    if (spec == nullptr)
+    const char* letter_entry = letter == ':' ? nullptr : std::strchr(option_string, letter);
+    if (letter_entry == nullptr)
         return '?';
-    if (spec[1] == ':') {
+    if (letter_entry[1] == ':') {
         if (a[2] != '\0') {
             argument = a + 2;
         } else {

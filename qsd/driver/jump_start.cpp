@@ -68,13 +68,13 @@ int jump_start(int argc, char** argv, const char* home) {
     std::printf("Invoking cmd <%s>\n", relaunch_command_text(argc, argv, home).c_str());
     std::fflush(stdout);
 
-    ProcessSpec spec;
-    spec.program = own_program(argv[0]);
-    spec.args = relaunch_arguments(argc, argv, home);
-    spec.stdout_path = log_file;
-    spec.stdout_mode = OutputMode::kAppend;
+    ProcessSpec job;
+    job.program = own_program(argv[0]);
+    job.args = relaunch_arguments(argc, argv, home);
+    job.stdout_path = log_file;
+    job.stdout_mode = OutputMode::kAppend;
 
-    const int status = run_process(spec);
+    const int status = run_process(job);
     if (status == kRunStdoutFailed) {
         std::fprintf(stderr, "Error: Can't open <%s>\n", log_file.c_str());
         return -8;

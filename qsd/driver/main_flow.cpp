@@ -115,7 +115,17 @@ int run_main(int argc, char** argv) {
         status = installer.go();
     }
     progress_finish(status);
-    ZR7_RETURN(finish(zr7_trace, zr7_unit, status));
+    status = finish(zr7_trace, zr7_unit, status);
+    // Standard output is the log, the run's record. When some of it could
+    // not be written (a full disk), the run says so where it still can and
+    // does not end as a success.
+    if (std::ferror(stdout) != 0) {
+        std::fprintf(stderr, "Error: Can't write <%s>\n",
+                     (installer.log_dir + "qsdinst.log").c_str());
+        if (status == 0)
+            status = -8;
+    }
+    ZR7_RETURN(status);
 }
 
 }  // namespace zr7

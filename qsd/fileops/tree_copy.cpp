@@ -22,9 +22,16 @@ int Installer610::copy(const std::string& src_template, const std::string& dst_t
     ZR7_DETAIL("expanded src path <%s>", src.c_str());
     ZR7_DETAIL("expanded dst path <%s>", dst.c_str());
 
-    // A source directory the image does not have is nothing to do.
+    // A source directory the image does not have is nothing to do; one that
+    // is there and cannot be read is a failure, or its files would be left
+    // out of a run that reports success.
     zr7::StringList names;
     if (InstallUtil::get_file_list(src.c_str(), names) == -7) {
+        struct stat st {};
+        if (::stat(src.c_str(), &st) == 0 && S_ISDIR(st.st_mode)) {
+            ZR7_ERROR("Error: Can't open <%s>", src.c_str());
+            ZR7_RETURN(-7);
+        }
         ZR7_DETAIL("No file to process in <%s>", src.c_str());
         ZR7_RETURN(0);
     }

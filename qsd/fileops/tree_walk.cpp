@@ -35,18 +35,36 @@ struct DirCloser {
 using DirStream = std::unique_ptr<DIR, DirCloser>;
 
 // InstallUtil::copy once the source's status is known, so that the walk
-// queries each entry only once.
+// queries each entry only once. A failure names its paths: the walk stops
+// there and the run with it.
 int copy_entry(const char* src, const struct stat& src_st, const char* dst, unsigned flags) {
+    ZR7_TRACED("InstallUtil::copy");
     if (S_ISDIR(src_st.st_mode)) {
         struct stat dst_st {};
-        if (::stat(dst, &dst_st) != 0)
-            return InstallUtil::mkdir(dst);
+        if (::stat(dst, &dst_st) == 0)
+            return 0;
+        // Another run may have created it since the look.
+        if (InstallUtil::mkdir(dst) != 0 &&
+            !(::stat(dst, &dst_st) == 0 && S_ISDIR(dst_st.st_mode))) {
+            ZR7_ERROR("Error: Unable to create directory <%s>", dst);
+            return -1;
+        }
         return 0;
     }
     const int status = InstallUtil::copy_file(src, dst, flags);
     if (status == 0)
         zr7::progress_file_copied(dst);
+    else
+        ZR7_ERROR("Error: Copy src <%s> to dst <%s> failed", src, dst);
     return status;
+}
+
+// A link whose target cannot be reached (dangling, or a loop of links) is
+// passed over; any other entry that cannot be looked at (a path too long, no
+// permission) would be left out without a word, so it fails the walk.
+bool is_link(const std::string& path) {
+    struct stat st {};
+    return ::lstat(path.c_str(), &st) == 0 && S_ISLNK(st.st_mode);
 }
 
 int apply(InstallUtil::EntryOperation operation, const std::string& src, const struct stat& src_st,
@@ -64,8 +82,10 @@ int walk(const std::string& src, const std::string& dst, InstallUtil::EntryOpera
     ZR7_OPERATION("InstallUtil::recursive_process");
     ZR7_DETAIL("src <%s> dst <%s>", src.c_str(), dst.c_str());
     DirStream stream(::opendir(src.c_str()));
-    if (!stream)
+    if (!stream) {
+        ZR7_ERROR("Error: Can't open <%s>", src.c_str());
         ZR7_RETURN(-7);
+    }
 
     // The top of the walk: the deeper levels are pushed by their parents from
     // the status they already queried.
@@ -92,8 +112,13 @@ int walk(const std::string& src, const std::string& dst, InstallUtil::EntryOpera
         dst_path.resize(dst_prefix);
         dst_path += name;
         struct stat st {};
-        if (::stat(src_path.c_str(), &st) != 0)
-            continue;
+        if (::stat(src_path.c_str(), &st) != 0) {
+            if (is_link(src_path))
+                continue;
+            ZR7_ERROR("Error: Can't access <%s>", src_path.c_str());
+            status = -7;
+            break;
+        }
 
         if (S_ISDIR(st.st_mode)) {
             if (on_open_path(open_path, st)) {

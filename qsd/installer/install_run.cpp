@@ -9,6 +9,13 @@ int Installer610::init(const std::string& src_dir, const std::string& home_dir) 
     source_path = src_dir;
     home_path = home_dir.empty() ? "./" : home_dir;
     int status = read_config(home_path);
+    // The server name and the architecture name directories: a NUL byte read
+    // from kmsenv would cut such a path short and name another directory.
+    if (status == 0 &&
+        (server_name.find('\0') != std::string::npos || arch.find('\0') != std::string::npos)) {
+        ZR7_ERROR("Error: Server name or architecture in kmsenv holds a NUL byte");
+        status = -1;
+    }
     if (status == 0) {
         tmp_path = InstallUtil::get_tmp_path();
         host_name = InstallUtil::get_hostname();

@@ -33,12 +33,11 @@ constexpr int kRunStdoutFailed = -3;  // output file could not be opened, or is 
 // untouched, and an output that is the input file itself is refused before it
 // is truncated. Standard output is flushed first so that the tool's own lines
 // and the child's stay in order.
-int run_process(const ProcessSpec& spec);
+int run_process(const ProcessSpec& job);
 
 // Full path of `program` on PATH ("" when not found). The answer is cached
-// per program name and PATH value and used without looking at the disk
-// again: a run starts the same few programs thousands of times. When a
-// cached program fails to start, run_process searches PATH once more.
+// per program name and PATH value: a run starts the same few programs
+// thousands of times.
 std::string find_on_path(const std::string& program);
 
 }  // namespace zr7

@@ -24,6 +24,8 @@ int Installer610::seed(const std::string& src_template, const std::string& dst_t
     // copies, a missing source directory is a failure here (-7).
     zr7::StringList names;
     int status = InstallUtil::get_file_list(src.c_str(), names);
+    if (status != 0)
+        ZR7_ERROR("Error: Can't open <%s>", src.c_str());
     if (status == 0) {
         for (const std::string& name : names) {
             status = seed_single_file(dst, name);

@@ -18,23 +18,23 @@ namespace {
 int run_loader(const std::string& response_path, const std::string& log_dir,
                const std::string& log_path) {
     ZR7_TRACED("Installer610::seed_single_file");
-    zr7::ProcessSpec spec;
-    spec.program = "qdsload";
-    spec.stdin_path = response_path;
+    zr7::ProcessSpec job;
+    job.program = "qdsload";
+    job.stdin_path = response_path;
     if (!log_path.empty()) {
         struct stat st {};
         if (::stat(log_dir.c_str(), &st) != 0)
             (void)InstallUtil::mkdir(log_dir.c_str());
-        spec.stdout_path = log_path;
-        spec.stdout_mode = zr7::OutputMode::kAppend;
+        job.stdout_path = log_path;
+        job.stdout_mode = zr7::OutputMode::kAppend;
     }
-    const int result = zr7::run_process(spec);
+    const int result = zr7::run_process(job);
     // Without a shell in between nobody else says why the loader did not
     // run, so these two say it.
     if (result == zr7::kRunStdoutFailed)
         ZR7_DETAIL("Error: Can't open <%s>", log_path.c_str());
     else if (result == zr7::kRunNotStarted)
-        ZR7_DETAIL("Error: Can't start <%s>", spec.program.c_str());
+        ZR7_DETAIL("Error: Can't start <%s>", job.program.c_str());
     return result == 0 ? 0 : -6;
 }
 
@@ -51,6 +51,13 @@ int Installer610::seed_single_file(const std::string& dst_dir, const std::string
             ZR7_RETURN(0);
         case zr7::SqlSelection::kSeed:
             break;
+    }
+
+    // The response file gives the loader one value a line: a name holding a
+    // line break would hand it lines of the image's choosing.
+    if (file_name.find('\n') != std::string::npos) {
+        ZR7_ERROR("Error: Can't seed <%s>: the name holds a line break", file_name.c_str());
+        ZR7_RETURN(-6);
     }
 
     ZR7_DETAIL("Using SQLLIB <%s> ", dst_dir.c_str());

@@ -1,5 +1,7 @@
 #include "support/test_support.h"
 
+#include <dirent.h>
+#include <fcntl.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -32,14 +34,39 @@ bool exists(const std::string& path) {
     struct stat st {};
     return ::lstat(path.c_str(), &st) == 0;
 }
-void remove_tree(const std::string& path) {
+
+namespace {
+
+// Each level is reached from the one above, so that trees deeper than a
+// path can name are removed too.
+void remove_at(int parent, const std::string& name) {
     struct stat st {};
-    if (::lstat(path.c_str(), &st) == 0 && S_ISDIR(st.st_mode)) {
-        ::chmod(path.c_str(), 0700);  // a test may have taken the permissions away
-        for (const std::string& name : list_dir(path))
-            remove_tree(path + "/" + name);
+    if (::fstatat(parent, name.c_str(), &st, AT_SYMLINK_NOFOLLOW) != 0)
+        return;
+    if (!S_ISDIR(st.st_mode)) {
+        ::unlinkat(parent, name.c_str(), 0);
+        return;
     }
-    std::remove(path.c_str());
+    ::fchmodat(parent, name.c_str(), 0700, 0);
+    const int fd = ::openat(parent, name.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW);
+    if (DIR* dir = fd < 0 ? nullptr : ::fdopendir(fd)) {
+        std::vector<std::string> names;
+        while (struct dirent* entry = ::readdir(dir)) {
+            const std::string inner = entry->d_name;
+            if (inner != "." && inner != "..")
+                names.push_back(inner);
+        }
+        for (const std::string& inner : names)
+            remove_at(::dirfd(dir), inner);
+        ::closedir(dir);
+    }
+    ::unlinkat(parent, name.c_str(), AT_REMOVEDIR);
+}
+
+}  // namespace
+
+void remove_tree(const std::string& path) {
+    remove_at(AT_FDCWD, path);
 }
 
 std::vector<std::string> list_dir(const std::string& path) {

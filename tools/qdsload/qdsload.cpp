@@ -4,8 +4,9 @@
 // $SQLLIB, records the load in qdsload.catalog beside $SQLLIB, and prints a
 // one-line summary on standard output.
 //
-// Exit status: 0 loaded; 1 bad input (message on standard error); 3 the file
-// is the one that QDSLOAD_FAIL names (a failure on demand, for tests).
+// Exit status: 0 loaded; 1 bad input or output that cannot be written
+// (message on standard error); 3 the file is the one that QDSLOAD_FAIL names
+// (a failure on demand, for tests).
 //
 // QDSLOAD_RECORD=<dir>, when set, makes it write what it saw into that
 // directory, before any check that concerns the file: <file name>.rsp holds
@@ -165,5 +166,10 @@ int main() {
 
     std::cout << "qdsload: loaded <" << file_name << "> from <" << sqllib << ">: " << statements
               << " statements over " << protocol << " " << host << ":" << port << "\n";
+    // A summary that cannot be written (a full disk under the seeding log)
+    // is a failed run: nobody would learn what was loaded.
+    std::cout.flush();
+    if (!std::cout)
+        return fail("cannot write standard output");
     return 0;
 }

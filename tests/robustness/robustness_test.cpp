@@ -1,0 +1,451 @@
+// Robustness of the whole tool: hostile names in the source image; odd shapes
+// of the image, of kmsenv and VXAENV and of the disk; runs killed at random
+// moments; runs at once. The tool is started by fork and exec so that a test
+// can set a file size limit, drop to another user, or kill its process group.
+#include <fcntl.h>
+#include <grp.h>
+#include <gtest/gtest.h>
+#include <signal.h>
+#include <sys/resource.h>
+#include <sys/stat.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <chrono>
+#include <filesystem>
+#include <random>
+#include <set>
+#include <thread>
+
+#include "qsd/envfile/env_rewrite.h"
+#include "support/test_support.h"
+
+namespace {
+using namespace std::string_literals;
+using zr7test::make_dirs;
+using zr7test::read_file;
+using zr7test::SampleInstall;
+using zr7test::write_file;
+using Snapshot = std::map<std::string, std::string>;
+namespace fs = std::filesystem;
+
+// ZR7_SOAK=1 (set by `make soak`) selects the long variants.
+int scaled(int quick, int long_run) {
+    return std::getenv("ZR7_SOAK") != nullptr && std::getenv("ZR7_SOAK") == "1"s ? long_run : quick;
+}
+
+struct Launch {
+    std::vector<std::string> options;  // before the image
+    bool relaunch = false;             // no "-o": the tool relaunches itself with its log
+    long long limit = -1;              // RLIMIT_FSIZE in bytes, SIGXFSZ ignored
+    bool as_nobody = false;            // setgid and setuid 65534 before exec
+    std::string cwd = "";
+};
+
+// Starts the tool with standard output and error on `fd`, in a process group
+// of its own (kill(-pid) reaches its children). The child allocates nothing.
+pid_t start(const SampleInstall& s, const Launch& l, int fd) {
+    std::vector<std::string> args{zr7test::tool_path(), "-o", s.home + "/logs/", "-h", s.home};
+    args.erase(args.begin() + 1, args.begin() + (l.relaunch ? 3 : 1));
+    args.insert(args.end(), l.options.begin(), l.options.end());
+    args.push_back(s.image);
+    std::vector<char*> argv(args.size() + 1, nullptr);
+    std::transform(args.begin(), args.end(), argv.begin(), [](auto& a) { return a.data(); });
+    for (const char* name : {"MARLIN_HOME", "MARLINHOME", "QDSLOAD_FAIL", "QDSLOAD_RECORD"})
+        ::unsetenv(name);
+    (void)(l.relaunch ? ::unsetenv("VXA_TRC1") : ::setenv("VXA_TRC1", "ERROR (UNIT:zr7 ALL)", 1));
+    if (std::string(std::getenv("PATH")).rfind(zr7test::bin_dir() + ":", 0) != 0)
+        ::setenv("PATH", (zr7test::bin_dir() + ":" + std::getenv("PATH")).c_str(), 1);
+    struct rlimit limit {};
+    limit.rlim_cur = limit.rlim_max = static_cast<rlim_t>(l.limit);
+    const pid_t pid = ::fork();
+    if (pid == 0) {
+        ::setpgid(0, 0);
+        ::signal(SIGXFSZ, SIG_IGN);
+        if ((l.cwd.empty() || ::chdir(l.cwd.c_str()) == 0) &&
+            ::dup2(::open("/dev/null", O_RDONLY), 0) == 0 && ::dup2(fd, 1) == 1 &&
+            ::dup2(fd, 2) == 2 && (l.limit < 0 || ::setrlimit(RLIMIT_FSIZE, &limit) == 0) &&
+            (!l.as_nobody ||
+             (::setgroups(0, nullptr) == 0 && ::setgid(65534) == 0 && ::setuid(65534) == 0)))
+            ::execv(argv[0], argv.data());
+        ::_exit(127);
+    }
+    ::setpgid(pid, pid);  // here too, so that a kill right after the start finds the group
+    return pid;
+}
+int wait_for(pid_t pid) {  // 0..255, or 128+N for signal N
+    int status = -1;
+    while (::waitpid(pid, &status, 0) < 0 && errno == EINTR) {
+    }
+    return WIFEXITED(status) ? WEXITSTATUS(status) : 128 + WTERMSIG(status);
+}
+// Output and errors in RunResult::out, through a pipe: no file size limit reaches it.
+zr7test::RunResult run_tool(const SampleInstall& s, const Launch& l) {
+    int fds[2];
+    zr7test::RunResult r;
+    if (::pipe2(fds, O_CLOEXEC) != 0)
+        return r;
+    const pid_t pid = start(s, l, fds[1]);
+    ::close(fds[1]);
+    char buffer[65536];
+    for (ssize_t n; (n = ::read(fds[0], buffer, sizeof buffer)) != 0 && (n > 0 || errno == EINTR);)
+        r.out.append(buffer, n > 0 ? static_cast<std::size_t>(n) : 0);
+    ::close(fds[0]);
+    r.exit_code = wait_for(pid);
+    return r;
+}
+// Every entry under `dir`, links not followed: "d", "l" + target, "f" + content.
+Snapshot snapshot(const std::string& dir) {
+    Snapshot out;
+    for (const fs::directory_entry& e : fs::recursive_directory_iterator(dir)) {
+        out[e.path().string().substr(dir.size() + 1)] =
+            e.is_symlink()     ? "l" + fs::read_symlink(e.path()).string()
+            : e.is_directory() ? "d"
+                               : "f" + read_file(e.path());
+    }
+    return out;
+}
+// Run `n` of a series adds module MOD<n> and setting KEY<n>=value<n>.
+std::vector<std::string> change_options(int n) {
+    return {"-m", "MOD" + std::to_string(n), "-c",
+            "KEY" + std::to_string(n) + "=value" + std::to_string(n)};
+}
+std::string changed_by(const std::string& content, int n) {
+    zr7::Dictionary settings;
+    settings.insert("KEY" + std::to_string(n), "value" + std::to_string(n));
+    return zr7::rewrite_env_content(content, settings, "MOD" + std::to_string(n)).content;
+}
+std::vector<std::string> backups(const SampleInstall& s) {
+    std::vector<std::string> found;
+    for (const std::string& name : zr7test::list_dir(s.tables() + "/.archive")) {
+        if (name.rfind("VXAENV_", 0) == 0)
+            found.push_back(s.tables() + "/.archive/" + name);
+    }
+    return found;
+}
+
+TEST(HostileImage, EveryNameLandsExactlyAndNothingRuns) {
+    // Every byte but "/" and NUL, shell bait ("@": a canary file that appears only
+    // if a name reaches a shell), option look-alikes, blanks, the longest name.
+    std::vector<std::string> names{std::string(255, 'n')};
+    for (int b = 1; b < 256; ++b) {
+        const std::string byte(1, static_cast<char>(b));
+        if (b != '/')
+            names.insert(names.end(), {"a" + byte + "z", b == '.' ? ".x" : byte});
+    }
+    // clang-format off
+    for (std::string bait : {"$(touch @)", "`touch @`", ";touch @", "|touch @", "&touch @",
+             "&&touch @&&", ">@", "<@", "'\";touch @;'", "\ntouch @\n", "${IFS}touch${IFS}@", "*",
+             "?", "[a-z]", "~", "!!", "-", "--", "-rf", "--help", "-o x", " ", "  lead", "trail  ",
+             "\t", "\r\n", "..."})
+        names.push_back(bait.find('@') == bait.npos ? bait : bait.replace(bait.find('@'), 1, "zr7canary"));
+    // clang-format on
+    SampleInstall s;
+    const std::string msrv = s.image + "/MSRV/", table = msrv + s.arch + "/TABLE/";
+    Snapshot want;  // keyed by the path below the server's tables
+    for (const std::string& name : names) {
+        const std::string content = "line\r\n" + name + "\r\n", sql = name.substr(0, 250) + ".txt";
+        make_dirs(table + "dirs/" + name);
+        make_dirs(table + "files");
+        for (const std::string& path : {msrv + "ATTRLIB/" + name, table + "files/" + name,
+                                        table + "dirs/" + name + "/inside", msrv + "SQLLIB/" + sql})
+            write_file(path, content);
+        std::string no_cr = "fline\n" + name + "\n";
+        no_cr.erase(std::remove(no_cr.begin(), no_cr.end(), '\r'), no_cr.end());
+        want["SRV1/ATTRLIB/" + name] = want["cicatrsq/ATTRLIB/" + name] = no_cr;
+        want["cicatrsq/SQLLIB/" + sql] = no_cr;
+        want["SRV1/files/" + name] = want["SRV1/dirs/" + name + "/inside"] = "f" + content;
+        want["SRV1/dirs/" + name] = "d";
+    }
+    // The loader is handed each seeded name as it is.
+    const std::vector<std::string> seeded = {"$(touch zr7canary).sql", "-rf.sql", "a b.sql",
+                                             "`x`;y.sql", "\xff\x01.sql"};
+    for (const std::string& name : seeded)
+        write_file(msrv + "SQLLIB/" + name, "INSERT INTO T VALUES (1);\n");
+    const Snapshot image_before = snapshot(s.image);
+    const zr7test::RunResult r = run_tool(s, {{}, true, -1, false, s.root.path()});
+    ASSERT_EQ(r.exit_code, 0) << r.out << read_file(s.home + "/logs/qsdinst.log").substr(0, 4000);
+    const Snapshot landed = snapshot(s.home + "/tables");
+    for (const auto& [path, what] : want)
+        EXPECT_TRUE(landed.count(path) == 1 && landed.at(path) == what) << path;
+    for (const auto& [p, what] : landed) {  // and nothing else lands beside them
+        const bool from_image = p.find("/dirs/") != p.npos || p.find("/files/") != p.npos ||
+                                (p.find("ATTRLIB/") != p.npos && p.find("kzr.atr") == p.npos);
+        EXPECT_TRUE(!from_image || want.count(p) == 1) << p;
+    }
+    const std::string catalog = read_file(s.cicatrsq() + "/qdsload.catalog");
+    for (const std::string& name : seeded)
+        EXPECT_NE(catalog.find(" loaded <" + name + "> "), std::string::npos) << name;
+    EXPECT_EQ(read_file(s.vxaenv), zr7test::kSampleVxaenv);
+    EXPECT_TRUE(snapshot(s.image) == image_before);
+    for (const auto& entry : snapshot(s.root.path()))
+        EXPECT_NE(fs::path(entry.first).filename(), "zr7canary");
+}
+
+// Odd shapes as one table: steps making the shape, options, how the run ends. A
+// full disk is a file size limit above every other file the run writes. Paths:
+// K kmsenv, V VXAENV, or with a prefix: I/ the image's MSRV, A/ its architecture
+// directory, T/ its TABLE tree, H/ the server's tables, O/ the home, R/ scratch.
+std::string path_of(const SampleInstall& s, const std::string& p) {
+    const std::string a = s.image + "/MSRV/" + s.arch + "/";
+    // clang-format off
+    const std::map<std::string, std::string> roots = {{"K", s.home + "/config/.ConfigData/kmsenv"},
+        {"V", s.vxaenv}, {"I/", s.image + "/MSRV/"}, {"A/", a}, {"T/", a + "TABLE/"},
+        {"H/", s.tables() + "/"}, {"O/", s.home + "/"}, {"R/", s.root.path() + "/"}};
+    // clang-format on
+    const auto root = roots.find(p.substr(0, p.size() == 1 ? 1 : 2));
+    return root == roots.end() ? p : root->second + p.substr(root->first.size());
+}
+// A step or a check, "word first rest".
+std::vector<std::string> parse(const std::string& text) {
+    const std::size_t one = std::min(text.find(' '), text.size()), two = text.find(' ', one + 1);
+    return {text.substr(0, one), text.substr(std::min(one + 1, text.size()), two - one - 1),
+            two == std::string::npos ? "" : text.substr(two + 1)};
+}
+// file P TEXT, dir P, fifo P, rm P, ln TARGET P, chmod MODE P (the path kept),
+// many P N (files f<i> holding <i>), deep P N (a chain of N directories named
+// like P, made level by level, beyond PATH_MAX too, a file "level" at the end).
+void shape(const SampleInstall& s, const std::vector<std::string>& steps) {
+    for (const std::string& text : steps) {
+        const std::vector<std::string> w = parse(text);
+        const std::string path = path_of(s, w[0] == "chmod" || w[0] == "ln" ? w[2] : w[1]);
+        const std::string parent = path.substr(0, path.rfind('/')),
+                          name = fs::path(path).filename();
+        if (w[0] == "chmod")  // the only step that keeps what stands there
+            ::chmod(path.c_str(), static_cast<mode_t>(std::stoul(w[1], nullptr, 8)));
+        else
+            zr7test::remove_tree(path);
+        make_dirs(w[0] == "dir" || w[0] == "many" ? path : parent);
+        if (w[0] == "file")
+            write_file(path, w[2]);
+        if (w[0] == "fifo")
+            ::mkfifo(path.c_str(), 0644);
+        if (w[0] == "ln" && ::symlink(path_of(s, w[1]).c_str(), path.c_str()) != 0)
+            ADD_FAILURE() << text;
+        for (int i = w[0] == "many" ? std::stoi(w[2]) - 1 : -1; i >= 0; --i)
+            write_file(path + "/f" + std::to_string(i), std::to_string(i));
+        int fd = w[0] == "deep" ? ::open(parent.c_str(), O_RDONLY | O_DIRECTORY) : -1;
+        for (int level = 0, up = -1; fd >= 0 && level < std::stoi(w[2]); ++level, ::close(up)) {
+            ::mkdirat(fd, name.c_str(), 0755);
+            fd = ::openat(up = fd, name.c_str(), O_RDONLY | O_DIRECTORY);
+        }
+        ::close(fd >= 0 ? ::openat(fd, "level", O_WRONLY | O_CREAT, 0644) : -1);
+        ::close(fd);
+    }
+}
+// "is P TEXT" (a regular file holding TEXT), "no P", "link P", "many P N".
+void check(const SampleInstall& s, const std::string& text) {
+    const std::vector<std::string> w = parse(text);
+    const std::string path = path_of(s, w[1]);
+    const fs::file_status st = fs::symlink_status(path);
+    EXPECT_TRUE(w[0] != "no" || !fs::exists(st)) << text;
+    EXPECT_TRUE(w[0] != "link" || fs::is_symlink(st)) << text;
+    EXPECT_TRUE(w[0] != "is" || (fs::is_regular_file(st) && read_file(path) == w[2])) << text;
+    for (int i = w[0] == "many" ? std::stoi(w[2]) - 1 : -1; i >= 0; --i)
+        ASSERT_EQ(read_file(path + "/f" + std::to_string(i)), std::to_string(i));
+}
+std::string times(int n, const std::string& text) {
+    std::string out;
+    while (n-- > 0)
+        out += text;
+    return out;
+}
+std::string garbage(std::size_t n) {
+    std::string bytes(n, '\0');
+    std::generate(bytes.begin(), bytes.end(), std::mt19937(1901));
+    return bytes;
+}
+
+struct ShapeCase {
+    const char* name;
+    std::vector<std::string> steps, options;
+    int exit_code;
+    std::string line, check = "";  // a line the output holds; see `check`
+    long long limit = -1;          // file size limit
+    bool as_nobody = false, relaunch = false;
+};
+void PrintTo(const ShapeCase& c, std::ostream* out) {
+    *out << c.name;
+}
+
+const std::vector<std::string> kChange = change_options(1);
+// clang-format off
+const std::string kRecords = "default|PORTNUMBER|1234|\nSRV1|NETWORKPROTOCOL|ip.pipe|\nSRV1|IPPIPEPORTNUMBER|1918|\nSRV1|BINARCH|lx8266|\n";
+const std::string kConfig = "FIELDSEP=|\n" + kRecords, kMebibyte(1 << 20, 'm');
+const std::string kLongSql = std::string(200, 'q') + ".sql", kWide = std::to_string(scaled(500, 20000));
+const std::string kCopy = "Error: Copy src <", kOpen = "Error: Can't open <", kKms = "Error: Can't open kmsenv";
+const ShapeCase kCases[] = {
+    // The image: depth, width, links, wrong kinds of file, unreadable entries.
+    {"two_hundred_levels_deep", {"deep T/d 200"}, {}, 0, "", "is H/" + times(200, "d/") + "level "},
+    {"paths_beyond_the_system_limit", {"deep T/" + std::string(30, 'p') + " 200"}, {}, 251, "Error: Can't access <"},
+    {"wide_directory", {"many A/lib " + kWide}, {}, 0, "", "many O/lx8266/ms/lib " + kWide},
+    {"link_to_file", {"ln T/table.dat T/ln"}, {}, 0, "", "is H/ln table\r\n"},
+    {"link_to_directory", {"ln T/sub T/lnd"}, {}, 0, "", "is H/lnd/deeper/nested.dat nested\r\n"},
+    {"dangling_link", {"ln R/gone T/dangling"}, {}, 0, "", "no H/dangling"},
+    {"looping_links", {"ln T/loop_b T/loop_a", "ln T/loop_a T/loop_b"}, {}, 0, "", "no H/loop_a"},
+    {"link_to_an_ancestor", {"ln .. T/sub/up"}, {}, 251, "Error: Directory loop at <"},
+    {"flat_link_to_file", {"ln I/ATTRLIB/kzr.atr I/ATTRLIB/ln.atr"}, {}, 0, "", "is H/ATTRLIB/ln.atr name kzr\nattr one\n"},
+    {"flat_dangling_link", {"ln R/gone I/ATTRLIB/gone"}, {}, 0, "", "no H/ATTRLIB/gone"},
+    {"flat_source_is_a_file", {"file I/ATTRLIB x"}, {}, 0, "No file to process in <"},
+    {"tree_source_is_a_file", {"file A/TABLE x"}, {}, 251, kOpen},
+    {"seed_source_is_a_file", {"file I/SQLLIB x"}, {}, 249, kOpen},
+    {"file_where_the_tree_has_a_directory", {"file H/sub a file\n"}, {}, 251, "Error: Unable to create directory <", "is H/sub a file\n"},
+    {"directory_where_a_file_goes", {"dir H/ATTRLIB/kzr.atr"}, {}, 251, kCopy},
+    {"destination_directory_missing", {"rm H/RKDSCATL"}, {}, 251, kCopy},
+    {"pipe_in_the_image", {"fifo I/ATTRLIB/pipe"}, {}, 251, kCopy},
+    {"device_in_the_image", {"ln /dev/zero T/zero"}, {}, 251, kCopy},
+    {"sql_name_with_a_line_break", {"file I/SQLLIB/a.sql\nend\nb.sql SELECT 1;\n"}, {}, 250, "the name holds a line break"},
+    {"unreadable_flat_file", {"chmod 0 I/ATTRLIB/kzr.atr"}, {}, 251, kCopy, "", -1, true},
+    {"unreadable_flat_directory", {"chmod 0 I/ATTRLIB"}, {}, 249, kOpen, "", -1, true},
+    {"unsearchable_flat_directory", {"chmod 444 I/ATTRLIB"}, {}, 249, "Error: Can't access <", "", -1, true},
+    {"unreadable_tree_file", {"chmod 0 T/table.dat"}, {}, 251, kCopy, "", -1, true},
+    {"unreadable_tree_directory", {"chmod 0 T/sub"}, {}, 251, kOpen, "", -1, true},
+    {"unreadable_sql_file", {"chmod 0 I/SQLLIB/kzr_a.sql"}, {}, 251, kCopy, "", -1, true},
+    // kmsenv: read as bytes, checked where it names directories.
+    {"kmsenv_crlf", {"file K FIELDSEP=|\r\nSRV1|NETWORKPROTOCOL|ip.pipe|\r\nSRV1|IPPIPEPORTNUMBER|1918|\r\nSRV1|BINARCH|lx8266|\r\n"}, {}, 0, ""},
+    {"kmsenv_no_final_newline", {"file K " + kConfig.substr(0, kConfig.size() - 1)}, {}, 0, ""},
+    {"kmsenv_nul_in_a_heading", {"file K HEAD\0ING=x\n"s + kConfig}, {}, 0, ""},
+    {"kmsenv_nul_in_the_server_name", {"file K FIELDSEP=|\nSRV1\0x|BINARCH|lx8266|\n"s}, {}, 255, "Error: Server name or architecture in kmsenv holds a NUL byte"},
+    {"kmsenv_nul_in_the_protocol", {"file K " + kConfig + "SRV1|NETWORKPROTOCOL|ip\0pipe|\n"s}, {}, 250, "Error: Seeding <"},
+    {"kmsenv_mebibyte_heading", {"file K " + kMebibyte + "\n" + kConfig}, {}, 0, ""},
+    {"kmsenv_mebibyte_record", {"file K " + kConfig + "SRV1|X|" + kMebibyte + "|\n"}, {}, 0, ""},
+    {"kmsenv_mebibyte_server_name", {"file K FIELDSEP=|\n" + kMebibyte + "|BINARCH|lx8266|\n"}, {}, 251, kCopy},
+    {"kmsenv_hundred_thousand_lines", {"file K " + times(50000, "HEADING=x\n") + "FIELDSEP=|\n" + times(50000, "default|PORTNUMBER|1|\n") + kRecords}, {}, 0, ""},
+    {"kmsenv_binary_garbage", {"file K " + garbage(65536)}, {}, 251, kCopy},
+    {"kmsenv_empty", {"file K "}, {}, 251, kCopy},
+    {"kmsenv_link_to_the_file", {"file R/kmsenv " + kConfig, "ln R/kmsenv K"}, {}, 0, ""},
+    {"kmsenv_dangling_link", {"ln R/gone K"}, {}, 2, kKms},
+    {"kmsenv_directory", {"dir K"}, {}, 21, kKms},
+    {"kmsenv_pipe", {"fifo K"}, {}, 22, kKms},
+    {"kmsenv_device", {"ln /dev/zero K"}, {}, 22, kKms},
+    {"kmsenv_unreadable", {"chmod 0 K"}, {}, 13, kKms, "", -1, true},
+    // VXAENV, with a module and a setting to apply.
+    {"vxaenv_nul_bytes", {"file V A=1\0x\nKDS_RUN=KDSMAIN\0;B\n\0\nKEY1=v\0\n"s}, kChange, 0, ""},
+    {"vxaenv_crlf", {"file V A=1\r\nKDS_RUN=KDSMAIN;X\r\nKEY1=v\r\n"}, kChange, 0, ""},
+    {"vxaenv_mebibyte_lines", {"file V LONG=" + kMebibyte + "\nKDS_RUN=" + kMebibyte + "\n" + kMebibyte + "\n"}, kChange, 0, ""},
+    {"vxaenv_binary_garbage", {"file V " + garbage(65536)}, kChange, 0, ""},
+    {"vxaenv_no_final_newline", {"file V A=1\nKDS_RUN=KDSMAIN"}, kChange, 0, ""},
+    {"vxaenv_hundred_thousand_lines", {"file V " + times(50000, "A=1\n") + "KDS_RUN=KDSMAIN\n" + times(50000, "B=2\n")}, kChange, 0, ""},
+    {"vxaenv_empty", {"file V "}, kChange, 0, ""},
+    {"vxaenv_link_to_the_file", {"file R/vxaenv KDS_RUN=A\n", "ln R/vxaenv V"}, kChange, 0, "", "link V"},
+    {"vxaenv_dangling_link", {"ln R/gone V"}, kChange, 249, kOpen},
+    {"vxaenv_directory", {"dir V"}, kChange, 249, kOpen},
+    {"vxaenv_pipe", {"fifo V"}, kChange, 249, kOpen},
+    {"vxaenv_device", {"ln /dev/zero V"}, kChange, 249, kOpen},
+    {"vxaenv_unreadable", {"chmod 0 V"}, kChange, 249, kOpen, "", -1, true},
+    // A full disk at each place the tool writes.
+    {"full_disk_flat_copy", {"file I/ATTRLIB/big.atr " + std::string(8192, 'x') + "\n", "file H/ATTRLIB/big.atr old\n"}, {}, 251, kCopy, "is H/ATTRLIB/big.atr old\n", 4096},
+    {"full_disk_tree_copy", {"file T/big.dat " + std::string(8192, 'x') + "\n", "file H/big.dat old\n"}, {}, 251, kCopy, "is H/big.dat old\n", 4096},
+    {"full_disk_new_environment_file", {"file V #" + std::string(4000, 'x') + "\n"}, {"-c", "ADDED=" + std::string(200, 'v')}, 248, "Error: Can't write <", "", 4096},
+    {"full_disk_backup", {"file V BIG=" + std::string(8192, 'x') + "\n"}, {"-c", "BIG=small"}, 247, "Error: Can't backup VXAENV", "", 4096},
+    {"full_disk_response_file", {"rm I/SQLLIB", "file I/SQLLIB/" + kLongSql + " SELECT 1;\n"}, {"-s"}, 248, "Error: Seeding <" + kLongSql + "> failed", "", 128},
+    {"full_disk_seeding_log", {"file O/logs/kzr_a.sql.log " + std::string(4096, 'x') + "\n", "file O/logs/kzr_b.sql.log " + std::string(4096, 'x') + "\n"}, {}, 250, "Error: Seeding <kzr_", "", 4096},
+    {"full_disk_log", {}, {}, 248, "Error: Can't write <", "", 4096, false, true},
+};
+// clang-format on
+
+class Shapes : public ::testing::TestWithParam<ShapeCase> {};
+
+TEST_P(Shapes, EndWithTheirStatusAndLineAndVxaenvWholeAndRight) {
+    const ShapeCase& c = GetParam();
+    if (c.as_nobody && ::geteuid() != 0)
+        GTEST_SKIP() << "only root can run as an unprivileged user";
+    SampleInstall s;
+    shape(s, c.steps);
+    if (c.as_nobody)  // the whole tree, so that the unprivileged run can work in it
+        zr7test::run("/bin/chown", {"-R", "65534:65534", s.root.path()});
+    // Only a regular file is read: a test must not block on a pipe put in its place.
+    auto content_of = [](auto& p) { return fs::is_regular_file(p) ? read_file(p) : ""s; };
+    const std::string before = content_of(s.vxaenv);
+    const zr7test::RunResult r = run_tool(s, {c.options, c.relaunch, c.limit, c.as_nobody});
+    const auto has = [&](const std::string& t) { return r.out.find(t) != r.out.npos; };
+    EXPECT_EQ(r.exit_code, c.exit_code) << r.out.substr(0, 3000);
+    EXPECT_TRUE(c.relaunch || has("Exiting with rc <"));
+    EXPECT_TRUE(has(c.line)) << c.line;
+    EXPECT_TRUE(c.exit_code == 0 || has("Error: ")) << "a failure needs a line";
+    check(s, c.check);
+    // VXAENV changes only when asked and the run succeeds, then exactly as asked
+    // with the old file as its one backup; no scratch file is left.
+    const bool changed = c.options == kChange && c.exit_code == 0;
+    EXPECT_TRUE(content_of(s.vxaenv) == (changed ? changed_by(before, 1) : before));
+    EXPECT_TRUE(!changed || backups(s).size() == 1u);
+    for (const std::string& backup : backups(s))
+        EXPECT_TRUE(read_file(backup) == before) << backup;
+    for (const std::string& name : zr7test::list_dir(s.tables()))
+        EXPECT_TRUE(name.find("VXAENV.") == name.find(".zr7copy")) << name;  // both npos
+}
+
+INSTANTIATE_TEST_SUITE_P(All, Shapes, ::testing::ValuesIn(kCases),
+                         [](const ::testing::TestParamInfo<ShapeCase>& c) { return c.param.name; });
+
+// Starts a run that adds change `n`, its output appended to `output`.
+pid_t start_logged(const SampleInstall& s, int n, const std::string& output) {
+    const int fd = ::open(output.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, 0644);
+    const pid_t pid = start(s, {change_options(n)}, fd);
+    ::close(fd);
+    return pid;
+}
+
+// VXAENV stays old or new, backups are whole earlier states, the next run completes.
+TEST(Kills, VxaenvIsAlwaysOldOrNewAndEveryBackupWhole) {
+    SampleInstall s;
+    // A mebibyte, the module list in the middle: each stage of the update can be hit.
+    const std::string line = "SETTING=a value of one of the settings of the server, as most are\n";
+    const std::string big = times(10000, line) + "KDS_RUN=KDSMAIN;KDSTRACE\n" + times(10000, line);
+    write_file(s.vxaenv, big);
+    const unsigned seed =
+        unsigned(std::atoi(std::getenv("ZR7_SEED") ? std::getenv("ZR7_SEED") : "8"));
+    std::mt19937 random(seed);
+    std::set<std::string> states{big}, seen;
+    const auto began = std::chrono::steady_clock::now();
+    ASSERT_EQ(run_tool(s, {change_options(0)}).exit_code, 0);
+    const auto length = std::chrono::steady_clock::now() - began;
+    std::uniform_int_distribution<long long> moment(
+        0, std::chrono::duration_cast<std::chrono::microseconds>(length).count() * 6 / 5);
+    const int kills = scaled(12, 200);
+    int after_change = 0;
+    for (int k = 1; k <= kills; ++k) {
+        const std::string old_content = read_file(s.vxaenv);
+        const std::string new_content = changed_by(old_content, k);
+        states.insert(old_content);
+        const pid_t pid = start_logged(s, k, s.root / "run.out");
+        std::this_thread::sleep_for(std::chrono::microseconds(moment(random)));
+        ::kill(-pid, SIGKILL);
+        wait_for(pid);
+        const std::string now = read_file(s.vxaenv);
+        ASSERT_TRUE(now == old_content || now == new_content) << "kill " << k;
+        after_change += now == new_content ? 1 : 0;
+        ASSERT_EQ(run_tool(s, {change_options(k)}).exit_code, 0)
+            << "after kill " << k << ": " << read_file(s.root / "run.out");
+        ASSERT_TRUE(read_file(s.vxaenv) == new_content) << "after kill " << k;
+        // Backups of the killed run and of the one after it: each a whole earlier state.
+        for (const std::string& backup : backups(s))
+            ASSERT_TRUE(!seen.insert(backup).second || states.count(read_file(backup))) << backup;
+    }
+    std::printf("[ figures  ] ZR7_SEED=%u: %d kills, %d after the change, %zu backups\n", seed,
+                kills, after_change, seen.size());
+}
+
+// Eight runs at once take turns at VXAENV: one whole backup each, no change lost.
+TEST(Concurrency, EightRunsAtOnceAllKeepTheirChange) {
+    SampleInstall s;
+    for (int d = 0; d < 100; ++d)  // directories every run creates: the runs meet there too
+        shape(s, {"many T/dir" + std::to_string(d) + "/in 1"});
+    std::vector<pid_t> pids;
+    for (int n = 0; n < 8; ++n)
+        pids.push_back(start_logged(s, n, s.root / std::to_string(n)));
+    for (int n = 0; n < 8; ++n)
+        EXPECT_EQ(wait_for(pids[n]), 0) << read_file(s.root / std::to_string(n));
+    const std::string final_content = read_file(s.vxaenv);
+    std::set<std::string> backed_up;
+    for (const std::string& backup : backups(s))
+        backed_up.insert(read_file(backup));
+    EXPECT_EQ(backed_up.size(), 8u);
+    EXPECT_EQ(backed_up.count(zr7test::kSampleVxaenv), 1u);
+    for (int n = 0; n < 8; ++n)
+        EXPECT_EQ(changed_by(final_content, n), final_content) << "run " << n << " lost";
+}
+
+}  // namespace
