@@ -10,17 +10,9 @@
 int Installer610::copy(const std::string& src_template, const std::string& dst_template) {
     ZR7_OPERATION("Installer610::copy");
     std::string src;
-    if (src_template.empty() || resolve(src_template, src) < 0) {
-        ZR7_ERROR("Error: Bad src path <%s>", src_template.c_str());
-        ZR7_RETURN(-1);
-    }
     std::string dst;
-    if (dst_template.empty() || resolve(dst_template, dst) < 0) {
-        ZR7_ERROR("Error: Bad dst path <%s>", dst_template.c_str());
+    if (expand_src_dst(src_template, dst_template, src, dst) != 0)
         ZR7_RETURN(-1);
-    }
-    ZR7_DETAIL("expanded src path <%s>", src.c_str());
-    ZR7_DETAIL("expanded dst path <%s>", dst.c_str());
 
     // A source directory the image does not have is nothing to do; one that
     // is there and cannot be read is a failure, or its files would be left
@@ -56,17 +48,9 @@ int Installer610::recursive_copy(const std::string& src_template, const std::str
                                  const std::string& options) {
     ZR7_OPERATION("Installer610::recursive_copy");
     std::string src;
-    if (src_template.empty() || resolve(src_template, src) < 0) {
-        ZR7_ERROR("Error: Bad src path <%s>", src_template.c_str());
-        ZR7_RETURN(-1);
-    }
     std::string dst;
-    if (dst_template.empty() || resolve(dst_template, dst) < 0) {
-        ZR7_ERROR("Error: Bad dst path <%s>", dst_template.c_str());
+    if (expand_src_dst(src_template, dst_template, src, dst) != 0)
         ZR7_RETURN(-1);
-    }
-    ZR7_DETAIL("expanded src path <%s>", src.c_str());
-    ZR7_DETAIL("expanded dst path <%s>", dst.c_str());
 
     struct stat st {};
     if (::stat(src.c_str(), &st) != 0) {

@@ -99,3 +99,19 @@ int Installer610::resolve(const std::string& path_template, std::string& out) co
         out += '$';
     return 0;
 }
+
+int Installer610::expand_src_dst(const std::string& src_template, const std::string& dst_template,
+                                 std::string& src, std::string& dst) const {
+    ZR7_TRACED("Installer610::expand_src_dst");
+    if (src_template.empty() || resolve(src_template, src) < 0) {
+        ZR7_ERROR("Error: Bad src path <%s>", src_template.c_str());
+        return -1;
+    }
+    if (dst_template.empty() || resolve(dst_template, dst) < 0) {
+        ZR7_ERROR("Error: Bad dst path <%s>", dst_template.c_str());
+        return -1;
+    }
+    ZR7_DETAIL("expanded src path <%s>", src.c_str());
+    ZR7_DETAIL("expanded dst path <%s>", dst.c_str());
+    return 0;
+}

@@ -19,6 +19,11 @@ class Installer610 {
     int add_symbol(const char* name, const char* value);
     int add_path_symbol(const char* name, const char* value);
     int resolve(const std::string& path_template, std::string& out) const;
+    // Expands the source and destination templates of a copy or seed
+    // command, writing the bad-path error or the two "expanded" detail lines.
+    // 0, or -1 when a template is empty or cannot be expanded.
+    int expand_src_dst(const std::string& src_template, const std::string& dst_template,
+                       std::string& src, std::string& dst) const;
 
     // The install run.
     int init(const std::string& src_dir, const std::string& home_dir);

@@ -7,17 +7,9 @@
 int Installer610::seed(const std::string& src_template, const std::string& dst_template) {
     ZR7_OPERATION("Installer610::seed");
     std::string src;
-    if (src_template.empty() || resolve(src_template, src) < 0) {
-        ZR7_ERROR("Error: Bad src path <%s>", src_template.c_str());
-        ZR7_RETURN(-1);
-    }
     std::string dst;
-    if (dst_template.empty() || resolve(dst_template, dst) < 0) {
-        ZR7_ERROR("Error: Bad dst path <%s>", dst_template.c_str());
+    if (expand_src_dst(src_template, dst_template, src, dst) != 0)
         ZR7_RETURN(-1);
-    }
-    ZR7_DETAIL("expanded src path <%s>", src.c_str());
-    ZR7_DETAIL("expanded dst path <%s>", dst.c_str());
 
     // The source directory only supplies the names; the loader reads the
     // files from the destination, where the copy group put them. Unlike the
