@@ -12,10 +12,16 @@ namespace zr7 {
 // (wrapping in February 2037), from the system clock's seconds since 1970.
 unsigned backup_stamp(std::time_t now);
 
-// Copies `dir`/`file` to `base`/.archive/`file`_<stamp>, taking the next
-// free stamp when that name is taken. The backup appears under its name
-// only once it is complete and on the disk. 0 with the backup's path in
+// Copies `content` (the file `file` of the directory `dir_fd`, whose mode it
+// takes) to .archive/`file`_<stamp> in `base_fd`, taking the next free stamp
+// when that name is taken. The backup appears under its name only once it is
+// complete and on the disk. Another account's link at .archive is refused.
+// `base_shown` names the directory in messages. 0 with the backup's path in
 // `made`, or -9.
+int backup_content_at(int base_fd, const std::string& base_shown, const std::string& file,
+                      const std::string& content, unsigned mode, unsigned stamp, std::string& made);
+
+// The same for a file read from `dir`/`file`, into `base`/.archive, by path.
 int backup_file(const char* dir, const char* file, const char* base, unsigned stamp,
                 std::string& made);
 

@@ -8,35 +8,18 @@
 #include <unistd.h>
 
 #include <cerrno>
-#include <climits>
-#include <cstdlib>
 #include <ctime>
 
 #include "qsd/envfile/backup.h"
-#include "qsd/envfile/durable_file.h"
 #include "qsd/envfile/env_rewrite.h"
 #include "qsd/fileops/install_util.h"
 #include "qsd/installer/installer610.h"
 #include "qsd/platform/directory_lock.h"
-#include "qsd/platform/file_io.h"
+#include "qsd/platform/fs.h"
 #include "qsd/platform/progress.h"
 #include "qsd/platform/trace.h"
 
 namespace {
-
-// The file to read and replace: VXAENV itself, or the file its symbolic link
-// names, so that the link stays a link. "" when neither can be had.
-std::string real_target(const std::string& env_path) {
-    struct stat st {};
-    if (::lstat(env_path.c_str(), &st) != 0)
-        return std::string();
-    if (!S_ISLNK(st.st_mode))
-        return env_path;
-    char resolved[PATH_MAX];
-    if (::realpath(env_path.c_str(), resolved) == nullptr)
-        return std::string();
-    return resolved;
-}
 
 // A line break inside a requested value would become a line of its own in
 // the file, a setting nobody asked for (a second KDS_RUN among them).
@@ -48,13 +31,8 @@ const std::string* first_with_line_break(const zr7::Dictionary& settings) {
     return nullptr;
 }
 
-// Gives the new file the old one's permission bits, and its owner and group
-// when we may (root): the server must be able to read what it read before.
-bool take_over_attributes(int fd, const struct stat& old) {
-    if (::geteuid() == 0 && ::fchown(fd, old.st_uid, old.st_gid) != 0)
-        return false;
-    // After the owner: a change of owner may clear the set-id bits.
-    return ::fchmod(fd, old.st_mode & 07777) == 0;
+std::string join_dir(const std::string& dir, const std::string& name) {
+    return !dir.empty() && dir.back() == '/' ? dir + name : dir + "/" + name;
 }
 
 }  // namespace
@@ -79,32 +57,43 @@ int Installer610::update_vxaenv(const std::string& dir_template) {
         ZR7_RETURN(-1);
     }
 
-    const std::string env_path = zr7::join_dir(dir, "VXAENV");
-    const std::string target = real_target(env_path);
-    if (target.empty()) {
+    const std::string env_path = join_dir(dir, "VXAENV");
+    // Root's link at VXAENV is followed, so that the link stays a link and
+    // its target is replaced; another account's link is refused.
+    zr7::fs::UniqueFd dir_fd;
+    zr7::fs::Target target;
+    int error = open_in_home(dir, dir_fd);
+    if (error == 0)
+        error = zr7::fs::resolve_name(dir_fd.get(), "VXAENV", target);
+    struct stat link {};
+    if (error == 0 && !target.followed && zr7::fs::stat_at(dir_fd.get(), "VXAENV", link) == 0 &&
+        S_ISLNK(link.st_mode)) {
+        error = zr7::fs::kUntrustedLink;
+    }
+    if (error != 0) {
         ZR7_ERROR("Error: Can't open <%s>", env_path.c_str());
+        ZR7_ERROR("Error: <%s>: %s", env_path.c_str(), zr7::fs::error_text(error).c_str());
         ZR7_RETURN(-7);
     }
-
-    // The scratch file's name is settled (and shown) before anything is read;
-    // the file itself is made only when something changes. The process id
-    // keeps it apart from any other run's.
-    const std::string planned_new_path = target + ".new." + InstallUtil::get_pid();
-    ZR7_DETAIL("writing to <%s>", planned_new_path.c_str());
+    ZR7_DETAIL("writing to <%s>", (join_dir(dir, ".VXAENV.new.") + "XXXXXX").c_str());
 
     // Held until the new file is in place: a run that waits here reads the
     // file that the run before it wrote.
-    zr7::DirectoryLock lock(zr7::dir_part(target));
+    zr7::DirectoryLock lock(dir);
     if (!lock.locked()) {
         ZR7_ERROR("Error: Can't open <%s>", env_path.c_str());
         ZR7_RETURN(-7);
     }
 
+    zr7::fs::UniqueFd file;
     struct stat old {};
     std::string content;
-    if (::stat(target.c_str(), &old) != 0 || !S_ISREG(old.st_mode) ||
-        zr7::read_whole_file(target, content) != 0) {
+    error = zr7::fs::open_read(target.dir.get(), target.name, file, old);
+    if (error == 0)
+        error = zr7::fs::read_all(file.get(), content);
+    if (error != 0) {
         ZR7_ERROR("Error: Can't open <%s>", env_path.c_str());
+        ZR7_ERROR("Error: <%s>: %s", env_path.c_str(), zr7::fs::error_text(error).c_str());
         zr7::progress_env_result(false, "");
         ZR7_RETURN(-7);
     }
@@ -124,40 +113,34 @@ int Installer610::update_vxaenv(const std::string& dir_template) {
         ZR7_RETURN(0);
     }
 
-    std::string new_path = planned_new_path;
-    const int fd = zr7::create_exclusive_file(new_path);
-    if (fd < 0) {
-        ZR7_ERROR("Error: Can't open <%s>", new_path.c_str());
-        zr7::progress_env_result(false, "");
-        ZR7_RETURN(-8);
-    }
+    // The files installed so far reach the disk before VXAENV names them.
+    sync_written();
 
     // Everything up to the rename leaves VXAENV as it was; the scratch file
     // goes on every way out that did not rename it.
+    zr7::fs::AtomicReplace replace(target.dir.get(), target.name, true);
     int status = 0;
-    bool written =
-        zr7::write_all(fd, new_content) && take_over_attributes(fd, old) && ::fsync(fd) == 0;
-    if (::close(fd) != 0)
-        written = false;
     std::string backup;
-    if (!written) {
-        ZR7_ERROR("Error: Can't write <%s>", new_path.c_str());
+    error = replace.open("VXAENV.new");
+    const std::string new_path = join_dir(dir, replace.scratch_name());
+    if (error != 0) {
+        ZR7_ERROR("Error: Can't open <%s>", new_path.c_str());
+        ZR7_ERROR("Error: <%s>: %s", new_path.c_str(), zr7::fs::error_text(error).c_str());
         status = -8;
-    } else if (zr7::backup_file(dir.c_str(), "VXAENV", dir.c_str(),
-                                zr7::backup_stamp(std::time(nullptr)), backup) != 0) {
+    } else if ((error = zr7::fs::write_all(replace.fd(), new_content)) != 0 ||
+               (error = replace.adopt_attributes()) != 0 || (error = replace.sync_scratch()) != 0) {
+        ZR7_ERROR("Error: Can't write <%s>", new_path.c_str());
+        ZR7_ERROR("Error: <%s>: %s", new_path.c_str(), zr7::fs::error_text(error).c_str());
+        status = -8;
+    } else if (zr7::backup_content_at(dir_fd.get(), dir, "VXAENV", content, old.st_mode,
+                                      zr7::backup_stamp(std::time(nullptr)), backup) != 0) {
         ZR7_ERROR("Error: Can't backup VXAENV");
         status = -9;
-    } else if (::rename(new_path.c_str(), target.c_str()) != 0) {
+    } else if ((error = replace.commit()) != 0) {
         ZR7_ERROR("Error: Can't copy <%s> to <%s>", new_path.c_str(), env_path.c_str());
+        ZR7_ERROR("Error: <%s>: %s", env_path.c_str(), zr7::fs::error_text(error).c_str());
         status = -5;
-    } else {
-        new_path.clear();
-        // The rename is done; a failed sync only leaves its durability open.
-        if (::fsync(lock.fd()) != 0)
-            ZR7_ERROR("Error: Can't sync <%s>", zr7::dir_part(target).c_str());
     }
-    if (!new_path.empty())
-        InstallUtil::delete_file(new_path.c_str());
     zr7::progress_env_result(status == 0, status == 0 ? backup : std::string());
     ZR7_RETURN(status);
 }

@@ -1,119 +1,122 @@
-#include <limits.h>
-#include <sys/stat.h>
+#include <fcntl.h>
 #include <unistd.h>
 
-#include <cstdlib>
-
-#include "qsd/envfile/durable_file.h"
+#include "qsd/fileops/copy_at.h"
 #include "qsd/fileops/install_util.h"
+#include "qsd/platform/fs.h"
 #include "qsd/platform/process.h"
 #include "qsd/platform/trace.h"
 
+namespace zr7 {
+
 namespace {
 
-// The file a copy replaces: the destination itself, or the file its symbolic
-// link names, so that the link stays a link. "" when a link leads nowhere.
-std::string final_path(const char* dst) {
-    struct stat st {};
-    if (::lstat(dst, &st) != 0 || !S_ISLNK(st.st_mode))
-        return dst;
-    char resolved[PATH_MAX];
-    return ::realpath(dst, resolved) == nullptr ? std::string() : std::string(resolved);
-}
-
-// The permissions a copy gets: those of the file it replaces, with its owner
-// and group when we may set them (root), as `cp -f` keeps them when it writes
-// into an existing file; else those a new file of `cp` or of an output
-// redirection gets.
-bool give_attributes(const std::string& scratch, const std::string& target, const char* src,
-                     bool fix_cr) {
-    struct stat old {};
-    if (::stat(target.c_str(), &old) == 0) {
-        if (::geteuid() == 0 && ::chown(scratch.c_str(), old.st_uid, old.st_gid) != 0)
-            return false;
-        return ::chmod(scratch.c_str(), old.st_mode & 07777) == 0;
-    }
-    const mode_t mask = ::umask(0);
-    ::umask(mask);
-    struct stat source {};
-    const mode_t wanted = fix_cr || ::stat(src, &source) != 0 ? 0666 : source.st_mode & 0777;
-    return ::chmod(scratch.c_str(), wanted & ~mask) == 0;
-}
-
-// Copies into a scratch file beside the destination, then renames it over
-// the destination. So the destination is at every moment the old file or the
-// whole new one: a full disk or a kill leaves the old file, and runs that
-// copy the same file at once do not trip over each other (`cp` itself fails
-// when another process creates its destination first).
-int copy_into_place(const char* src, const char* dst, bool fix_cr) {
-    const std::string target = final_path(dst);
-    if (target.empty())
-        return -5;
-    std::string scratch;
-    const int fd = zr7::create_unique_file(zr7::dir_part(target) + "/.zr7copy", scratch);
-    if (fd < 0)
-        return -5;
-    ::close(fd);
-
-    zr7::ProcessSpec job;
+// `cp` and `tr` read and write the descriptors that were opened and checked
+// here, so nothing put in a file's place after the check is followed.
+int run_copy(int src_fd, int scratch_fd, bool fix_cr) {
+    if (::lseek(src_fd, 0, SEEK_SET) != 0)
+        return -1;
+    ProcessSpec job;
+    job.stdin_fd = src_fd;
+    job.stdout_fd = scratch_fd;
     if (fix_cr) {
         job.program = "tr";
         job.args = {"-d", "\r"};
-        job.stdin_path = src;
-        job.stdout_path = scratch;
-        job.stdout_mode = zr7::OutputMode::kTruncate;
     } else {
         job.program = "cp";
-        job.args = {"-f", "--", src, scratch};
+        job.args = {"-f", "--", "/dev/fd/0", "/dev/fd/1"};
     }
-    const bool done = zr7::run_process(job) == 0 && give_attributes(scratch, target, src, fix_cr) &&
-                      ::rename(scratch.c_str(), target.c_str()) == 0;
-    if (!done)
-        ::unlink(scratch.c_str());
-    return done ? 0 : -5;
+    return run_process(job);
 }
 
 }  // namespace
 
-// The command texts below are what the trace shows an administrator; the copy
-// itself runs `cp` or `tr` with an argument vector, so no byte of a file name
-// ever reaches a shell.
-int InstallUtil::copy_file(const char* src, const char* dst, unsigned flags) {
+int copy_file_at(int src_fd, const struct stat& src_st, const std::string& src_shown, int dst_dir,
+                 const std::string& name, const std::string& dst_shown, unsigned flags) {
     ZR7_TRACED("InstallUtil::copy_file");
-    if (src == nullptr || dst == nullptr)
-        return -5;  // nothing names the file: no copy, and no line to trace
     const int overwrite = (flags & kCopyOverwrite) != 0 ? 1 : 0;
     const int fix_cr = (flags & kCopyFixCr) != 0 ? 1 : 0;
     ZR7_DETAIL("Copy begin --------------");
-    ZR7_DETAIL("...src <%s>", src);
-    ZR7_DETAIL("...dst <%s>", dst);
+    ZR7_DETAIL("...src <%s>", src_shown.c_str());
+    ZR7_DETAIL("...dst <%s>", dst_shown.c_str());
     ZR7_DETAIL("...overwrite <%d> fix cr <%d>", overwrite, fix_cr);
 
-    struct stat st {};
-    const bool dst_exists = ::stat(dst, &st) == 0;
-    if (overwrite == 0 && dst_exists) {
+    fs::Target target;
+    int status = fs::resolve_name(dst_dir, name, target) == 0 ? 0 : -5;
+    struct stat dst_st {};
+    const bool dst_exists = status == 0 && fs::stat_at(target.dir.get(), target.name, dst_st) == 0;
+    if (status == 0 && overwrite == 0 && dst_exists) {
         ZR7_DETAIL("...file already exists");
         ZR7_DETAIL("Copy end ----------------");
         return 0;
     }
-    // A directory standing where the file goes is a failure: `cp` would put
-    // the file inside it and report success.
-    const bool dst_is_dir = dst_exists && S_ISDIR(st.st_mode);
-
     if (zr7_trace.detail()) {
-        const std::string shown = fix_cr != 0
-                                      ? "tr -d '\r' <" + quote_str(src) + " >" + quote_str(dst)
-                                      : "cp -f " + quote_str(src) + " " + quote_str(dst);
+        const std::string shown =
+            fix_cr != 0 ? "tr -d '\\r' <" + InstallUtil::quote_str(src_shown.c_str()) + " >" +
+                              InstallUtil::quote_str(dst_shown.c_str())
+                        : "cp -f " + InstallUtil::quote_str(src_shown.c_str()) + " " +
+                              InstallUtil::quote_str(dst_shown.c_str());
         ZR7_DETAIL("...issuing cmd <%s>", shown.c_str());
     }
-    // Only a regular file is copied: a pipe in the image would hold the copy
-    // forever, a device could fill the disk.
-    struct stat src_st {};
-    const bool src_is_file = ::stat(src, &src_st) == 0 && S_ISREG(src_st.st_mode);
-    const int status = src_is_file && !dst_is_dir ? copy_into_place(src, dst, fix_cr != 0) : -5;
-    if (status == 0)
-        removeReadOnly(dst);
+    // Only a regular file is copied (a pipe would hold the copy forever, a
+    // device could fill the disk), and never over a directory.
+    int error = 0;
+    if (status == 0 && (!S_ISREG(src_st.st_mode) || (dst_exists && S_ISDIR(dst_st.st_mode)))) {
+        error = S_ISREG(src_st.st_mode) ? EISDIR : fs::kNotRegular;
+        status = -5;
+    } else if (status == 0 && src_fd < 0) {
+        error = EACCES;
+        status = -5;
+    }
+    if (status == 0) {
+        fs::AtomicReplace replace(target.dir.get(), target.name, false);
+        error = replace.open();
+        if (error == 0 && run_copy(src_fd, replace.fd(), fix_cr != 0) != 0)
+            error = EIO;
+        const mode_t new_mode = fix_cr != 0 ? 0666 : (src_st.st_mode & 0777);
+        if (error == 0)
+            error = replace.commit(new_mode, S_IWUSR);
+        status = error == 0 ? 0 : -5;
+    }
+    if (status != 0 && error != 0 && error != EIO)
+        ZR7_ERROR("Error: <%s>: %s", dst_shown.c_str(), fs::error_text(error).c_str());
     ZR7_DETAIL("...rc = <%d>", status);
     ZR7_DETAIL("Copy end ----------------");
     return status;
+}
+
+}  // namespace zr7
+
+namespace {
+
+std::string dir_of(const std::string& path) {
+    const std::size_t slash = path.find_last_of('/');
+    if (slash == std::string::npos)
+        return ".";
+    return slash == 0 ? "/" : path.substr(0, slash);
+}
+
+std::string name_of(const std::string& path) {
+    const std::size_t slash = path.find_last_of('/');
+    return slash == std::string::npos ? path : path.substr(slash + 1);
+}
+
+}  // namespace
+
+// The copy between two paths that the caller names: their directories are
+// taken as given, the names below them by the link rule.
+int InstallUtil::copy_file(const char* src, const char* dst, unsigned flags) {
+    if (src == nullptr || dst == nullptr)
+        return -5;  // nothing names the file: no copy, and no line to trace
+    zr7::fs::UniqueFd src_dir;
+    zr7::fs::UniqueFd dst_dir;
+    zr7::fs::UniqueFd file;
+    struct stat st {};
+    if (zr7::fs::open_trusted_dir(dir_of(src), src_dir) != 0 ||
+        zr7::fs::open_read(src_dir.get(), name_of(src), file, st) != 0) {
+        st = {};
+    }
+    if (zr7::fs::open_trusted_dir(dir_of(dst), dst_dir) != 0)
+        return -5;
+    return zr7::copy_file_at(file.get(), st, src, dst_dir.get(), name_of(dst), dst, flags);
 }

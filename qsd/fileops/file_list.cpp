@@ -1,9 +1,9 @@
-#include <dirent.h>
+#include <fcntl.h>
 #include <sys/stat.h>
 
-#include <cstring>
-
 #include "qsd/fileops/install_util.h"
+#include "qsd/fileops/tree_walk.h"
+#include "qsd/platform/fs.h"
 #include "qsd/platform/trace.h"
 
 // The names of the non-directory entries of one directory, in the order the
@@ -13,32 +13,27 @@
 // on the directory) fails the list: its file would go missing unnoticed.
 int InstallUtil::get_file_list(const char* dir, zr7::StringList& list) {
     ZR7_TRACED("InstallUtil::get_file_list");
-    DIR* stream = ::opendir(dir);
-    if (stream == nullptr)
+    zr7::fs::UniqueFd fd;
+    zr7::StringList names;
+    if (dir == nullptr || zr7::fs::open_trusted_dir(dir, fd) != 0 ||
+        zr7::list_names(fd.get(), names) != 0) {
         return -7;
-    std::string path = dir;
-    path += '/';
-    const std::size_t prefix = path.size();
-    while (const struct dirent* entry = ::readdir(stream)) {
-        const char* name = entry->d_name;
-        if (std::strcmp(name, ".") == 0 || std::strcmp(name, "..") == 0)
-            continue;
-        path.resize(prefix);
-        path += name;
+    }
+    for (const std::string& name : names) {
         struct stat st {};
-        if (::stat(path.c_str(), &st) != 0) {
+        if (::fstatat(fd.get(), name.c_str(), &st, 0) != 0) {
             struct stat link {};
-            if (::lstat(path.c_str(), &link) == 0 && S_ISLNK(link.st_mode))
+            if (::fstatat(fd.get(), name.c_str(), &link, AT_SYMLINK_NOFOLLOW) == 0 &&
+                S_ISLNK(link.st_mode)) {
                 continue;
-            ZR7_ERROR("Error: Can't access <%s>", path.c_str());
-            ::closedir(stream);
+            }
+            ZR7_ERROR("Error: Can't access <%s/%s>", dir, name.c_str());
             return -7;
         }
         if (S_ISDIR(st.st_mode))
             continue;
-        ZR7_DETAIL("adding <%s>", name);
-        list.emplace_back(name);
+        ZR7_DETAIL("adding <%s>", name.c_str());
+        list.push_back(name);
     }
-    ::closedir(stream);
     return 0;
 }

@@ -1,166 +1,148 @@
-// The tree walk under the tree copy, and the per-entry copy it plugs in.
+#include "qsd/fileops/tree_walk.h"
+
 #include <dirent.h>
-#include <sys/stat.h>
+#include <fcntl.h>
+#include <unistd.h>
 
 #include <cstring>
-#include <memory>
-#include <vector>
+#include <set>
+#include <utility>
 
+#include "qsd/fileops/copy_at.h"
 #include "qsd/fileops/install_util.h"
+#include "qsd/platform/fs.h"
 #include "qsd/platform/progress.h"
 #include "qsd/platform/trace.h"
 
+namespace zr7 {
+
+int list_names(int dir, StringList& names) {
+    const int copy = ::fcntl(dir, F_DUPFD_CLOEXEC, 0);
+    if (copy < 0)
+        return errno;
+    DIR* stream = ::fdopendir(copy);
+    if (stream == nullptr) {
+        const int error = errno;
+        ::close(copy);
+        return error;
+    }
+    ::rewinddir(stream);
+    while (const struct dirent* entry = ::readdir(stream)) {
+        const char* name = entry->d_name;
+        if (std::strcmp(name, ".") != 0 && std::strcmp(name, "..") != 0)
+            names.emplace_back(name);
+    }
+    ::closedir(stream);
+    return 0;
+}
+
 namespace {
 
-// Device and inode of one directory on the path from the top of the walk to
-// the level being read.
-struct DirectoryId {
-    dev_t device;
-    ino_t inode;
+struct Walk {
+    const ImageRoot& root;
+    unsigned flags;
+    const ServerDirGuard& guard;
+    std::set<std::pair<dev_t, ino_t>> walked;
 };
 
-using OpenPath = std::vector<DirectoryId>;
-
-bool on_open_path(const OpenPath& path, const struct stat& st) {
-    for (const DirectoryId& id : path) {
-        if (id.device == st.st_dev && id.inode == st.st_ino)
-            return true;
-    }
-    return false;
-}
-
-struct DirCloser {
-    void operator()(DIR* stream) const { ::closedir(stream); }
-};
-using DirStream = std::unique_ptr<DIR, DirCloser>;
-
-// InstallUtil::copy once the source's status is known, so that the walk
-// queries each entry only once. A failure names its paths: the walk stops
-// there and the run with it.
-int copy_entry(const char* src, const struct stat& src_st, const char* dst, unsigned flags) {
-    ZR7_TRACED("InstallUtil::copy");
-    if (S_ISDIR(src_st.st_mode)) {
-        struct stat dst_st {};
-        if (::stat(dst, &dst_st) == 0)
-            return 0;
-        // Another run may have created it since the look.
-        if (InstallUtil::mkdir(dst) != 0 &&
-            !(::stat(dst, &dst_st) == 0 && S_ISDIR(dst_st.st_mode))) {
-            ZR7_ERROR("Error: Unable to create directory <%s>", dst);
-            return -1;
-        }
-        return 0;
-    }
-    const int status = InstallUtil::copy_file(src, dst, flags);
-    if (status == 0)
-        zr7::progress_file_copied(dst);
-    else
-        ZR7_ERROR("Error: Copy src <%s> to dst <%s> failed", src, dst);
-    return status;
-}
-
-// A link whose target cannot be reached (dangling, or a loop of links) is
-// passed over; any other entry that cannot be looked at (a path too long, no
-// permission) would be left out without a word, so it fails the walk.
-bool is_link(const std::string& path) {
+bool is_server_dir(const ServerDirGuard& guard, int dir) {
     struct stat st {};
-    return ::lstat(path.c_str(), &st) == 0 && S_ISLNK(st.st_mode);
+    return guard.active && ::fstat(dir, &st) == 0 && st.st_dev == guard.device &&
+           st.st_ino == guard.inode;
 }
 
-int apply(InstallUtil::EntryOperation operation, const std::string& src, const struct stat& src_st,
-          const std::string& dst, unsigned flags) {
-    if (operation == &InstallUtil::copy)
-        return copy_entry(src.c_str(), src_st, dst.c_str(), flags);
-    return operation(src.c_str(), dst.c_str(), flags);
-}
-
-// One level of the walk. `open_path` holds the directories of the levels
-// above; a sub-directory found among them (a symbolic link back to an
-// ancestor, say) would make the walk recurse without end, so it is refused.
-int walk(const std::string& src, const std::string& dst, InstallUtil::EntryOperation operation,
-         unsigned flags, OpenPath& open_path) {
+int walk(Walk& w, const ImageEntry& src, const std::string& src_shown, int dst_dir,
+         const std::string& dst_shown) {
     ZR7_OPERATION("InstallUtil::recursive_process");
-    ZR7_DETAIL("src <%s> dst <%s>", src.c_str(), dst.c_str());
-    DirStream stream(::opendir(src.c_str()));
-    if (!stream) {
-        ZR7_ERROR("Error: Can't open <%s>", src.c_str());
+    ZR7_DETAIL("src <%s> dst <%s>", src_shown.c_str(), dst_shown.c_str());
+    StringList names;
+    if (const int error = list_names(src.fd.get(), names)) {
+        ZR7_ERROR("Error: Can't open <%s>", src_shown.c_str());
+        ZR7_ERROR("Error: <%s>: %s", src_shown.c_str(), fs::error_text(error).c_str());
         ZR7_RETURN(-7);
     }
-
-    // The top of the walk: the deeper levels are pushed by their parents from
-    // the status they already queried.
-    bool pushed_self = false;
-    if (open_path.empty()) {
-        struct stat self {};
-        if (::fstat(::dirfd(stream.get()), &self) == 0) {
-            open_path.push_back({self.st_dev, self.st_ino});
-            pushed_self = true;
-        }
-    }
-
-    std::string src_path = src + "/";
-    const std::size_t src_prefix = src_path.size();
-    std::string dst_path = dst;
-    const std::size_t dst_prefix = dst_path.size();
-    int status = 0;
-    while (const struct dirent* entry = ::readdir(stream.get())) {
-        const char* name = entry->d_name;
-        if (std::strcmp(name, ".") == 0 || std::strcmp(name, "..") == 0)
+    const bool server_dir = is_server_dir(w.guard, dst_dir);
+    // Scratch files of a run that was killed; the run lock keeps live runs out.
+    fs::remove_stale_scratch(dst_dir, "zr7copy");
+    for (const std::string& name : names) {
+        const std::string src_path = src_shown + "/" + name;
+        const std::string dst_path = dst_shown + name;
+        ImageEntry entry;
+        const int opened =
+            open_image_entry(w.root, src.fd.get(), src.where, src.outside, name, entry);
+        if (opened == ENOENT || (opened == 0 && entry.kind == EntryKind::kPassOver))
             continue;
-        src_path.resize(src_prefix);
-        src_path += name;
-        dst_path.resize(dst_prefix);
-        dst_path += name;
-        struct stat st {};
-        if (::stat(src_path.c_str(), &st) != 0) {
-            if (is_link(src_path))
-                continue;
+        if (opened == kLeadsOutside) {
+            ZR7_ERROR("Error: Link <%s> leads outside the image", src_path.c_str());
+            ZR7_RETURN(-5);
+        }
+        if (opened != 0) {
             ZR7_ERROR("Error: Can't access <%s>", src_path.c_str());
-            status = -7;
-            break;
+            ZR7_ERROR("Error: <%s>: %s", src_path.c_str(), fs::error_text(opened).c_str());
+            ZR7_RETURN(-7);
         }
-
-        if (S_ISDIR(st.st_mode)) {
-            if (on_open_path(open_path, st)) {
+        if (server_dir && name == ".archive") {
+            ZR7_ERROR("Error: The image may not write into <%s>", dst_path.c_str());
+            ZR7_RETURN(-5);
+        }
+        if (entry.kind == EntryKind::kDirectory) {
+            if (!w.walked.insert({entry.st.st_dev, entry.st.st_ino}).second) {
                 ZR7_ERROR("Error: Directory loop at <%s>", src_path.c_str());
-                status = -5;
-                break;
+                ZR7_RETURN(-5);
             }
-            status = apply(operation, src_path, st, dst_path, flags);
-            if (status != 0)
-                break;
-            open_path.push_back({st.st_dev, st.st_ino});
-            status = walk(src_path, dst_path + "/", operation, flags, open_path);
-            open_path.pop_back();
-            if (status != 0)
-                break;
-        } else {
-            ZR7_DETAIL("processing<%s>", dst_path.c_str());
-            status = apply(operation, src_path, st, dst_path, flags);
-            if (status != 0)
-                break;
+            fs::UniqueFd sub;
+            if (const int error = fs::make_dir(dst_dir, name, sub)) {
+                ZR7_ERROR("Error: Unable to create directory <%s>", dst_path.c_str());
+                ZR7_ERROR("Error: <%s>: %s", dst_path.c_str(), fs::error_text(error).c_str());
+                ZR7_RETURN(-1);
+            }
+            if (const int status = walk(w, entry, src_path, sub.get(), dst_path + "/"))
+                ZR7_RETURN(status);
+            continue;
         }
+        if (server_dir && name == "VXAENV" && (w.flags & kCopyOverwrite) != 0 &&
+            w.guard.back_up_env_file) {
+            if (const int status = w.guard.back_up_env_file())
+                ZR7_RETURN(status);
+        }
+        ZR7_DETAIL("processing<%s>", dst_path.c_str());
+        const int status =
+            copy_file_at(entry.fd.get(), entry.st, src_path, dst_dir, name, dst_path, w.flags);
+        if (status != 0) {
+            ZR7_ERROR("Error: Copy src <%s> to dst <%s> failed", src_path.c_str(),
+                      dst_path.c_str());
+            ZR7_RETURN(status);
+        }
+        progress_file_copied(dst_path);
     }
-    if (pushed_self)
-        open_path.pop_back();
-    ZR7_RETURN(status);
+    ZR7_RETURN(0);
 }
 
 }  // namespace
 
-int InstallUtil::recursive_process(const char* src, const char* dst, EntryOperation operation,
-                                   unsigned flags) {
-    OpenPath open_path;
-    return walk(src, dst, operation, flags, open_path);
+int copy_tree(const ImageRoot& root, const ImageEntry& src, const std::string& src_shown,
+              int dst_dir, const std::string& dst_shown, unsigned flags,
+              const ServerDirGuard& guard) {
+    Walk w{root, flags, guard, {}};
+    w.walked.insert({src.st.st_dev, src.st.st_ino});
+    return walk(w, src, src_shown, dst_dir, dst_shown);
 }
 
-int InstallUtil::copy(const char* src, const char* dst, unsigned flags) {
-    struct stat st {};
-    if (::stat(src, &st) != 0)
-        return 0;
-    return copy_entry(src, st, dst, flags);
-}
+}  // namespace zr7
 
+// The tree copy between two paths that the caller names, taken as given.
 int InstallUtil::xcopy(const char* src, const char* dst, unsigned flags) {
-    return recursive_process(src, dst, &InstallUtil::copy, flags) == 0 ? 0 : -5;
+    if (src == nullptr || dst == nullptr)
+        return -5;
+    zr7::ImageRoot root;
+    zr7::ImageEntry top;
+    zr7::fs::UniqueFd dst_dir;
+    if (zr7::open_image_root(src, root) != 0 || zr7::open_image_dir(root, "", top) != 0 ||
+        zr7::fs::open_trusted_dir(dst, dst_dir) != 0) {
+        return -5;
+    }
+    std::string shown = dst;
+    if (shown.empty() || shown.back() != '/')
+        shown += '/';
+    return zr7::copy_tree(root, top, src, dst_dir.get(), shown, flags, {}) == 0 ? 0 : -5;
 }

@@ -8,6 +8,7 @@ int Installer610::init(const std::string& src_dir, const std::string& home_dir) 
     ZR7_OPERATION("Installer610::init");
     source_path = src_dir;
     home_path = home_dir.empty() ? "./" : home_dir;
+    (void)open_home();
     int status = read_config(home_path);
     // The server name and the architecture name directories: a NUL byte read
     // from kmsenv would cut such a path short and name another directory.
@@ -56,6 +57,8 @@ int Installer610::go() {
         ZR7_DETAIL("Seeding disabled");
     CommandList commands = build_command_list(copying != 0, seeding != 0);
     const int status = process_commands(commands);
+    // What was installed is on the disk before the run reports it.
+    sync_written();
     ZR7_RETURN(status);
 }
 

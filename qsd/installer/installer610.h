@@ -2,8 +2,13 @@
 #pragma once
 
 #include <string>
+#include <utility>
+#include <vector>
 
+#include "qsd/fileops/image_tree.h"
+#include "qsd/fileops/tree_walk.h"
 #include "qsd/installer/simple_command.h"
+#include "qsd/platform/fs.h"
 #include "qsd/text/dictionary.h"
 
 class Installer610 {
@@ -36,7 +41,21 @@ class Installer610 {
     // Environment file.
     int update_vxaenv(const std::string& dir_template);
     int update_kds_run(const std::string& line, std::string& out) const;
-    int make_backup(const char* dir, const char* file, const char* base);
+
+    // Where the commands read and write: the directories below the
+    // installation directory and below the image's MSRV that a command path
+    // names, opened by the link rules of the file-system layer. A path
+    // outside both is opened as given. 0 or an error number.
+    int open_home();
+    int open_in_home(const std::string& path, zr7::fs::UniqueFd& out) const;
+    int open_in_image(const std::string& path, zr7::ImageEntry& out);
+    // Remembers the file system of a directory the run writes into, and
+    // flushes every such file system to the disk: before VXAENV names what
+    // was installed, and before the run reports success.
+    void note_written(int dir);
+    void sync_written();
+    // The server's table directory, for the tree copies.
+    zr7::ServerDirGuard server_dir_guard();
 
     // Flat and tree copies.
     int copy(const std::string& src_template, const std::string& dst_template);
@@ -46,6 +65,9 @@ class Installer610 {
     // Catalog seeding.
     int seed(const std::string& src_template, const std::string& dst_template);
     int seed_single_file(const std::string& dst_dir, const std::string& file_name);
+    // Opens (creating it and the log directory when missing) the seeding log
+    // of an SQL file for appending. 0 or an error number.
+    int open_seeding_log(const std::string& file_name, zr7::fs::UniqueFd& out);
 
     std::string home_path;       // installation directory, ending in "/"
     std::string family_setting;  // "KDC_FAMILIES=PORT:<port> <protocol> USE:Y"
@@ -62,4 +84,8 @@ class Installer610 {
     int copying = 1;             // cleared by -s
     zr7::Dictionary settings;    // -c key=val, keys upper-cased
     zr7::Dictionary symbols;     // HOMEPATH, SRCPATH, BINARCH, QMSNAME
+    zr7::fs::UniqueFd home_fd;   // the installation directory, open
+    zr7::ImageRoot image;        // the image's MSRV, open once a command reads it
+    int image_error = -1;        // -1 before the first open, then 0 or its error
+    std::vector<std::pair<dev_t, zr7::fs::UniqueFd>> written;  // one directory per file system
 };

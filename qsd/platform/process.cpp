@@ -84,10 +84,10 @@ int run_process(const ProcessSpec& job) {
     // The input is opened, and checked to be readable data, before the output
     // is touched: a directory opens for reading but yields nothing, and would
     // otherwise cost an existing output its content.
-    FdGuard in_fd(job.stdin_path.empty() ? -1
-                                         : ::open(job.stdin_path.c_str(), O_RDONLY | O_CLOEXEC));
+    const bool in_by_path = job.stdin_fd < 0 && !job.stdin_path.empty();
+    FdGuard in_fd(!in_by_path ? -1 : ::open(job.stdin_path.c_str(), O_RDONLY | O_CLOEXEC));
     struct stat in_st {};
-    if (!job.stdin_path.empty() &&
+    if (in_by_path &&
         (in_fd.get() < 0 || ::fstat(in_fd.get(), &in_st) != 0 || S_ISDIR(in_st.st_mode))) {
         return kRunStdinFailed;
     }
@@ -97,10 +97,9 @@ int run_process(const ProcessSpec& job) {
     int out_flags = O_WRONLY | O_CREAT | O_CLOEXEC;
     if (job.stdout_mode == OutputMode::kAppend)
         out_flags |= O_APPEND;
-    FdGuard out_fd(job.stdout_mode == OutputMode::kInherit
-                       ? -1
-                       : ::open(job.stdout_path.c_str(), out_flags, 0666));
-    if (job.stdout_mode != OutputMode::kInherit) {
+    const bool out_by_path = job.stdout_fd < 0 && job.stdout_mode != OutputMode::kInherit;
+    FdGuard out_fd(!out_by_path ? -1 : ::open(job.stdout_path.c_str(), out_flags, 0666));
+    if (out_by_path) {
         struct stat out_st {};
         if (out_fd.get() < 0 || ::fstat(out_fd.get(), &out_st) != 0)
             return kRunStdoutFailed;
@@ -122,10 +121,12 @@ int run_process(const ProcessSpec& job) {
     posix_spawn_file_actions_t actions;
     if (posix_spawn_file_actions_init(&actions) != 0)
         return kRunNotStarted;
-    if (in_fd.get() >= 0)
-        posix_spawn_file_actions_adddup2(&actions, in_fd.get(), STDIN_FILENO);
-    if (out_fd.get() >= 0)
-        posix_spawn_file_actions_adddup2(&actions, out_fd.get(), STDOUT_FILENO);
+    const int child_in = job.stdin_fd >= 0 ? job.stdin_fd : in_fd.get();
+    const int child_out = job.stdout_fd >= 0 ? job.stdout_fd : out_fd.get();
+    if (child_in >= 0)
+        posix_spawn_file_actions_adddup2(&actions, child_in, STDIN_FILENO);
+    if (child_out >= 0)
+        posix_spawn_file_actions_adddup2(&actions, child_out, STDOUT_FILENO);
 
     std::fflush(stdout);
     pid_t pid = 0;

@@ -20,6 +20,10 @@ struct ProcessSpec {
     // file gets mode 0666 less the umask.
     std::string stdout_path;
     OutputMode stdout_mode = OutputMode::kInherit;
+    // Descriptors the caller opened and checked, put in place of standard
+    // input and output; when set, the path of that stream is not opened.
+    int stdin_fd = -1;
+    int stdout_fd = -1;
 };
 
 // Statuses of run_process besides the program's own 0..255 and 128+signal.

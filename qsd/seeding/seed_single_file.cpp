@@ -1,13 +1,13 @@
 // One loader run: the response file, the loader's environment, the run itself
 // with its seeding log.
-#include <sys/stat.h>
+#include <unistd.h>
 
 #include "qsd/fileops/install_util.h"
 #include "qsd/installer/installer610.h"
+#include "qsd/platform/fs.h"
 #include "qsd/platform/process.h"
 #include "qsd/platform/progress.h"
 #include "qsd/platform/trace.h"
-#include "qsd/seeding/private_file.h"
 #include "qsd/seeding/seed_texts.h"
 #include "qsd/seeding/sql_selection.h"
 
@@ -15,27 +15,23 @@ namespace {
 
 // Runs the loader on the response file, its output appended to the seeding
 // log when there is one. Returns 0 when the loader succeeded, else -6.
-int run_loader(const std::string& response_path, const std::string& log_dir,
-               const std::string& log_path) {
+int run_loader(int response_fd, int log_fd) {
     ZR7_TRACED("Installer610::seed_single_file");
     zr7::ProcessSpec job;
     job.program = "qdsload";
-    job.stdin_path = response_path;
-    if (!log_path.empty()) {
-        struct stat st {};
-        if (::stat(log_dir.c_str(), &st) != 0)
-            (void)InstallUtil::mkdir(log_dir.c_str());
-        job.stdout_path = log_path;
-        job.stdout_mode = zr7::OutputMode::kAppend;
-    }
+    job.stdin_fd = response_fd;
+    job.stdout_fd = log_fd;
     const int result = zr7::run_process(job);
     // Without a shell in between nobody else says why the loader did not
-    // run, so these two say it.
-    if (result == zr7::kRunStdoutFailed)
-        ZR7_DETAIL("Error: Can't open <%s>", log_path.c_str());
-    else if (result == zr7::kRunNotStarted)
+    // run, so this says it.
+    if (result == zr7::kRunNotStarted)
         ZR7_DETAIL("Error: Can't start <%s>", job.program.c_str());
     return result == 0 ? 0 : -6;
+}
+
+std::string name_of(const std::string& path) {
+    const std::size_t slash = path.find_last_of('/');
+    return slash == std::string::npos ? path : path.substr(slash + 1);
 }
 
 }  // namespace
@@ -68,11 +64,32 @@ int Installer610::seed_single_file(const std::string& dst_dir, const std::string
         log_dir.empty() ? std::string() : zr7::seeding_log_path(log_dir, file_name);
     const std::string command = zr7::loader_command_text(response_path, log_path);
 
+    // The response file lives in a directory that everybody may write: it is
+    // made under a scratch name nobody can have prepared and renamed into
+    // place, and the loader reads it from the descriptor written here.
     int status = -6;
     const std::string content = zr7::response_file_content(protocol, host_name, port, file_name);
-    if (zr7::create_private_file(response_path, content) != 0) {
+    zr7::fs::UniqueFd tmp_dir;
+    int error = zr7::fs::open_trusted_dir(tmp_path, tmp_dir);
+    const std::string response_name = name_of(response_path);
+    zr7::fs::AtomicReplace response(tmp_dir.get(), response_name, false);
+    response.make_private();
+    bool placed = false;
+    if (error == 0)
+        error = response.open("qsdseed");
+    if (error == 0)
+        error = zr7::fs::write_all(response.fd(), content);
+    if (error == 0 && (error = response.commit(0600)) == 0)
+        placed = true;
+    zr7::fs::UniqueFd log_fd;
+    if (error != 0) {
         ZR7_DETAIL("Error: Unable to create <%s> ", response_path.c_str());
+        ZR7_ERROR("Error: <%s>: %s", response_path.c_str(), zr7::fs::error_text(error).c_str());
         status = -8;
+    } else if (!log_path.empty() && (error = open_seeding_log(file_name, log_fd)) != 0) {
+        ZR7_DETAIL("Error: Can't open <%s>", log_path.c_str());
+        ZR7_ERROR("Error: <%s>: %s", log_path.c_str(), zr7::fs::error_text(error).c_str());
+        status = -6;
     } else {
         ZR7_DETAIL("protocol <%s> hostname <%s> port <%s>", protocol.c_str(), host_name.c_str(),
                    port.c_str());
@@ -84,11 +101,13 @@ int Installer610::seed_single_file(const std::string& dst_dir, const std::string
         PLT1_PutEnv("VXA_TRC1=ERROR");
         ZR7_DETAIL("issuing cmd <%s> ", command.c_str());
         zr7::progress_seeding(file_name);
-        status = run_loader(response_path, log_dir, log_path);
+        (void)::lseek(response.fd(), 0, SEEK_SET);
+        status = run_loader(response.fd(), log_fd.get());
         if (status == 0)
             zr7::progress_seeded(file_name);
     }
     // Whatever happened, the response file does not outlive the run.
-    InstallUtil::delete_file(response_path.c_str());
+    if (placed)
+        (void)zr7::fs::remove_file(tmp_dir.get(), response_name);
     ZR7_RETURN(status);
 }

@@ -1,0 +1,40 @@
+// The walk under the tree copies: the image directory's tree, copied into a
+// directory of the installation.
+#pragma once
+
+#include <sys/types.h>
+
+#include <functional>
+#include <string>
+
+#include "qsd/fileops/image_tree.h"
+#include "qsd/text/text.h"
+
+namespace zr7 {
+
+// What the image may not do to the server's own directory (the one that
+// holds VXAENV and .archive): replace VXAENV without a backup first, or
+// write anything into .archive.
+struct ServerDirGuard {
+    bool active = false;
+    dev_t device = 0;
+    ino_t inode = 0;
+    // Backs VXAENV up before a copy replaces it; 0 or the failure's status.
+    std::function<int()> back_up_env_file;
+};
+
+// The names in an open directory, "." and ".." left out, in the order the
+// directory yields them. 0 or errno.
+int list_names(int dir, StringList& names);
+
+// Copies the tree below `src` into `dst_dir` (shown as `dst_shown`, ending
+// in "/"), creating sub-directories as it reaches them. Each image directory
+// is walked at most once: reaching one again (a link back up, or links
+// between siblings) fails with "Directory loop". 0, or the status of the
+// first failure (-5 copy or loop, -7 an entry that cannot be read, -1 a
+// directory that cannot be made, -9 a backup).
+int copy_tree(const ImageRoot& root, const ImageEntry& src, const std::string& src_shown,
+              int dst_dir, const std::string& dst_shown, unsigned flags,
+              const ServerDirGuard& guard);
+
+}  // namespace zr7
