@@ -64,6 +64,7 @@ pid_t start(const SampleInstall& s, const Launch& l, int fd) {
     if (pid == 0) {
         ::setpgid(0, 0);
         ::signal(SIGXFSZ, SIG_IGN);
+        ::umask(022);  // the modes the tests expect, whoever runs them
         if ((l.cwd.empty() || ::chdir(l.cwd.c_str()) == 0) &&
             ::dup2(::open("/dev/null", O_RDONLY), 0) == 0 && ::dup2(fd, 1) == 1 &&
             ::dup2(fd, 2) == 2 && (l.limit < 0 || ::setrlimit(RLIMIT_FSIZE, &limit) == 0) &&
@@ -213,7 +214,12 @@ void shape(const SampleInstall& s, const std::vector<std::string>& steps) {
         const std::string path = path_of(s, w[0] == "chmod" || w[0] == "ln" ? w[2] : w[1]);
         const std::string parent = path.substr(0, path.rfind('/')),
                           name = fs::path(path).filename();
-        if (w[0] == "chmod")  // the only step that keeps what stands there
+        if (w[0] == "own") {  // another account's: 65534 owns it, a link itself
+            if (::lchown(path.c_str(), 65534, 65534) != 0)
+                ADD_FAILURE() << text;
+            continue;
+        }
+        if (w[0] == "chmod")  // with "own", the steps that keep what stands there
             ::chmod(path.c_str(), static_cast<mode_t>(std::stoul(w[1], nullptr, 8)));
         else
             zr7test::remove_tree(path);
@@ -235,9 +241,25 @@ void shape(const SampleInstall& s, const std::vector<std::string>& steps) {
         ::close(fd);
     }
 }
-// "is P TEXT" (a regular file holding TEXT), "no P", "link P", "many P N".
-void check(const SampleInstall& s, const std::string& text) {
+// "is P TEXT" (a regular file holding TEXT), "no P", "link P", "many P N",
+// "mode P OCTAL", "owner P UID:GID"; several joined by " && ".
+void check(const SampleInstall& s, const std::string& all) {
+    const std::size_t join = all.find(" && ");
+    if (join != std::string::npos) {
+        check(s, all.substr(0, join));
+        return check(s, all.substr(join + 4));
+    }
+    const std::string& text = all;
     const std::vector<std::string> w = parse(text);
+    struct stat attributes {};
+    const bool present = ::lstat(path_of(s, w[1]).c_str(), &attributes) == 0;
+    EXPECT_TRUE(w[0] != "mode" ||
+                (present && (attributes.st_mode & 07777) == std::stoul(w[2], nullptr, 8)))
+        << text << " " << std::oct << attributes.st_mode;
+    EXPECT_TRUE(w[0] != "owner" || (present && std::to_string(attributes.st_uid) + ":" +
+                                                       std::to_string(attributes.st_gid) ==
+                                                   w[2]))
+        << text << " " << attributes.st_uid;
     const std::string path = path_of(s, w[1]);
     const fs::file_status st = fs::symlink_status(path);
     EXPECT_TRUE(w[0] != "no" || !fs::exists(st)) << text;
@@ -343,6 +365,25 @@ const ShapeCase kCases[] = {
     {"full_disk_response_file", {"rm I/SQLLIB", "file I/SQLLIB/" + kLongSql + " SELECT 1;\n"}, {"-s"}, 248, "Error: Seeding <" + kLongSql + "> failed", "", 128},
     {"full_disk_seeding_log", {"file O/logs/kzr_a.sql.log " + std::string(4096, 'x') + "\n", "file O/logs/kzr_b.sql.log " + std::string(4096, 'x') + "\n"}, {}, 250, "Error: Seeding <kzr_", "", 4096},
     {"full_disk_log", {}, {}, 248, "Error: Can't write <", "", 4096, false, true},
+    // Another account (65534) owns the server's directories and the image and
+    // plants links and odd files; root installs. What lies outside stays as it is.
+    {"attack_destination_file_link", {"file R/victim secret\n", "ln R/victim H/table.dat", "own H/table.dat"}, {}, 0, "", "is R/victim secret\n && is H/table.dat table\r\n"},
+    {"attack_destination_root_link_followed", {"file R/target old\n", "ln R/target H/table.dat"}, {}, 0, "", "link H/table.dat && is R/target table\r\n"},
+    {"attack_destination_directory_link", {"dir R/victim", "ln R/victim H/sub", "own H/sub"}, {}, 251, "Error: Unable to create directory <", "no R/victim/deeper"},
+    {"attack_flat_destination_directory_link", {"dir R/victim", "rm H/ATTRLIB", "ln R/victim H/ATTRLIB", "own H/ATTRLIB"}, {}, 251, kOpen, "no R/victim/kzr.atr"},
+    {"attack_vxaenv_link", {"file R/victim KDS_RUN=A\n", "ln R/victim V", "own V"}, kChange, 249, kOpen, "is R/victim KDS_RUN=A\n"},
+    {"attack_archive_link", {"dir R/victim", "ln R/victim H/.archive", "own H/.archive"}, {"-c", "K=v"}, 247, "Error: Unable to create backup directory <", "no R/victim/VXAENV_1"},
+    {"attack_seeding_log_link", {"file R/victim secret\n", "ln R/victim O/logs/kzr_a.sql.log", "own O/logs/kzr_a.sql.log"}, {}, 250, "Error: Seeding <kzr_a.sql> failed", "is R/victim secret\n"},
+    {"attack_seeding_log_fifo", {"fifo O/logs/kzr_a.sql.log"}, {}, 250, "Error: Seeding <kzr_a.sql> failed"},
+    {"attack_image_link_out", {"file R/secret root only\n", "chmod 0600 R/secret", "ln R/secret T/stolen", "own T/stolen"}, {}, 251, "Error: Link <", "no H/stolen"},
+    {"attack_image_root_link_out_followed", {"file R/shared shared\n", "ln R/shared T/shared"}, {}, 0, "", "is H/shared shared\n"},
+    {"attack_image_inside_link_followed", {"ln I/ATTRLIB/kzr.atr T/inside", "own T/inside"}, {}, 0, "", "is H/inside name kzr\r\nattr one\r\n"},
+    {"attack_image_writes_archive", {"file T/.archive/VXAENV_1 forged\n"}, {}, 251, "Error: The image may not write into <", "no H/.archive/VXAENV_1"},
+    {"attack_sibling_link_chain", {"dir T/c0", "ln T/c0 T/c1/l", "ln T/c1 T/c2/l", "ln T/c2 T/c3/l"}, {}, 251, "Error: Directory loop at <"},
+    {"new_directory_mode_and_owner", {"file T/fresh/x new\n", "own H/."}, {}, 0, "", "mode H/fresh 0755 && owner H/fresh 65534:65534 && owner H/fresh/x 65534:65534"},
+    {"replaced_file_keeps_mode_and_owner", {"file H/table.dat old\n", "chmod 0640 H/table.dat", "own H/table.dat"}, {}, 0, "", "mode H/table.dat 0640 && owner H/table.dat 65534:65534 && is H/table.dat table\r\n"},
+    {"vxaenv_keeps_its_owner", {"own V", "chmod 0640 V"}, kChange, 0, "", "owner V 65534:65534 && mode V 0640"},
+    {"old_lib_and_bin_files_replaced", {"file A/lib/libkzr.so new lib\n", "file O/lx8266/ms/lib/libkzr.so old lib\n", "file A/bin/kzrtool new bin\n", "file O/lx8266/ms/bin/kzrtool old bin\n"}, {}, 0, "", "is O/lx8266/ms/lib/libkzr.so new lib\n && is O/lx8266/ms/bin/kzrtool new bin\n"},
 };
 // clang-format on
 
@@ -389,6 +430,49 @@ pid_t start_logged(const SampleInstall& s, int n, const std::string& output) {
 }
 
 // VXAENV stays old or new, backups are whole earlier states, the next run completes.
+// Another account races root's copies for a bounded time: it swaps every
+// scratch file it sees for a link to a root-only file outside, and turns
+// files of the image into pipes. The victim keeps its bytes, owner and mode,
+// and no run hangs.
+TEST(Races, SwappedScratchFilesAndPipesNeverReachTheVictim) {
+    if (::geteuid() != 0)
+        GTEST_SKIP() << "the race needs root and an unprivileged account";
+    SampleInstall s;
+    shape(s, {"many T/wide 300", "file R/victim root only\n", "chmod 0600 R/victim"});
+    zr7test::run("/bin/chown", {"-R", "65534:65534", s.home, s.image});
+    ::chmod(s.root.path().c_str(), 0755);
+    const std::string victim = path_of(s, "R/victim"), wide = path_of(s, "T/wide");
+    for (int round = 0; round < scaled(3, 20); ++round) {
+        const pid_t racer = ::fork();
+        if (racer == 0) {
+            if (::setgid(65534) != 0 || ::setuid(65534) != 0)
+                ::_exit(1);
+            const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(3);
+            for (int i = 0; std::chrono::steady_clock::now() < end; ++i) {
+                for (const std::string& dir : {s.tables() + "/wide", s.tables()}) {
+                    for (const std::string& name : zr7test::list_dir(dir)) {
+                        const std::string path = dir + "/" + name;
+                        if (name.rfind(".zr7copy.", 0) == 0 && ::unlink(path.c_str()) == 0)
+                            (void)::symlink(victim.c_str(), path.c_str());
+                    }
+                }
+                const std::string file = wide + "/f" + std::to_string(i % 300);
+                if (i % 7 == 0 && ::unlink(file.c_str()) == 0)
+                    (void)::mkfifo(file.c_str(), 0644);
+            }
+            ::_exit(0);
+        }
+        const zr7test::RunResult r = run_tool(s, {{}, false, -1, false});
+        EXPECT_TRUE(r.exit_code == 0 || r.exit_code == 251) << r.out.substr(0, 2000);
+        wait_for(racer);
+        struct stat st {};
+        ASSERT_EQ(::lstat(victim.c_str(), &st), 0);
+        EXPECT_EQ(read_file(victim), "root only\n");
+        EXPECT_EQ(st.st_uid, 0u);
+        EXPECT_EQ(st.st_mode & 07777, 0600u);
+    }
+}
+
 TEST(Kills, VxaenvIsAlwaysOldOrNewAndEveryBackupWhole) {
     SampleInstall s;
     // A mebibyte, the module list in the middle: each stage of the update can be hit.
