@@ -11,6 +11,7 @@
 
 #include "qsd/driver/driver.h"
 #include "qsd/fileops/install_util.h"
+#include "qsd/platform/fs.h"
 #include "qsd/platform/process.h"
 #include "qsd/platform/trace.h"
 
@@ -59,6 +60,17 @@ std::string own_program(const char* invoked) {
     return std::string(buffer, static_cast<std::size_t>(length));
 }
 
+int open_log(const std::string& home, fs::UniqueFd& out) {
+    fs::UniqueFd home_fd;
+    fs::UniqueFd dir;
+    int error = fs::open_trusted_dir(home, home_fd);
+    if (error == 0)
+        error = fs::open_dir_below(home_fd.get(), home == "./" ? "." : "logs", dir);
+    if (error == 0)
+        error = fs::open_append(dir.get(), "qsdinst.log", out);
+    return error;
+}
+
 }  // namespace
 
 int jump_start(int argc, char** argv, const char* home) {
@@ -68,17 +80,20 @@ int jump_start(int argc, char** argv, const char* home) {
     std::printf("Invoking cmd <%s>\n", relaunch_command_text(argc, argv, home).c_str());
     std::fflush(stdout);
 
+    // The log lies in the server's directory: opened by the link rule,
+    // refused when it is not a regular file, never waited on.
+    fs::UniqueFd log_fd;
+    if (open_log(home, log_fd) != 0) {
+        std::fprintf(stderr, "Error: Can't open <%s>\n", log_file.c_str());
+        return -8;
+    }
     ProcessSpec job;
     job.program = own_program(argv[0]);
     job.args = relaunch_arguments(argc, argv, home);
     job.stdout_path = log_file;
-    job.stdout_mode = OutputMode::kAppend;
+    job.stdout_fd = log_fd.get();
 
     const int status = run_process(job);
-    if (status == kRunStdoutFailed) {
-        std::fprintf(stderr, "Error: Can't open <%s>\n", log_file.c_str());
-        return -8;
-    }
     if (status < 0) {
         std::fprintf(stderr, "Error: Can't start <%s>\n", argv[0]);
         return kRelaunchNotStarted;

@@ -374,6 +374,8 @@ const ShapeCase kCases[] = {
     {"attack_vxaenv_link", {"file R/victim KDS_RUN=A\n", "ln R/victim V", "own V"}, kChange, 249, kOpen, "is R/victim KDS_RUN=A\n"},
     {"attack_archive_link", {"dir R/victim", "ln R/victim H/.archive", "own H/.archive"}, {"-c", "K=v"}, 247, "Error: Unable to create backup directory <", "no R/victim/VXAENV_1"},
     {"attack_seeding_log_link", {"file R/victim secret\n", "ln R/victim O/logs/kzr_a.sql.log", "own O/logs/kzr_a.sql.log"}, {}, 250, "Error: Seeding <kzr_a.sql> failed", "is R/victim secret\n"},
+    {"attack_log_link", {"file R/victim secret\n", "ln R/victim O/logs/qsdinst.log", "own O/logs/qsdinst.log"}, {}, 248, "Error: Can't open <", "is R/victim secret\n", -1, false, true},
+    {"attack_log_fifo", {"fifo O/logs/qsdinst.log"}, {}, 248, "Error: Can't open <", "", -1, false, true},
     {"attack_seeding_log_fifo", {"fifo O/logs/kzr_a.sql.log"}, {}, 250, "Error: Seeding <kzr_a.sql> failed"},
     {"attack_image_link_out", {"file R/secret root only\n", "chmod 0600 R/secret", "ln R/secret T/stolen", "own T/stolen"}, {}, 251, "Error: Link <", "no H/stolen"},
     {"attack_image_root_link_out_followed", {"file R/shared shared\n", "ln R/shared T/shared"}, {}, 0, "", "is H/shared shared\n"},
