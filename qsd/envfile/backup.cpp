@@ -45,6 +45,8 @@ int backup_content_at(int base_fd, const std::string& base_shown, const std::str
         ZR7_RETURN(-9);
     }
 
+    fs::remove_stale_scratch(archive_fd.get(), file + ".backup");
+
     // The copy is made under a scratch name of our own and given the backup
     // name with link(), which never replaces an existing file: a kill leaves
     // at most a stray scratch file, never a partial backup or a lost one.

@@ -85,6 +85,9 @@ int Installer610::update_vxaenv(const std::string& dir_template) {
         ZR7_RETURN(-7);
     }
 
+    // Scratch files of a run that was killed here; the locks keep live runs out.
+    zr7::fs::remove_stale_scratch(target.dir.get(), "VXAENV.new");
+
     zr7::fs::UniqueFd file;
     struct stat old {};
     std::string content;
