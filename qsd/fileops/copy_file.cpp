@@ -51,11 +51,11 @@ int copy_file_at(int src_fd, const struct stat& src_st, const std::string& src_s
         return 0;
     }
     if (zr7_trace.detail()) {
-        const std::string shown =
-            fix_cr != 0 ? "tr -d '\\r' <" + InstallUtil::quote_str(src_shown.c_str()) + " >" +
-                              InstallUtil::quote_str(dst_shown.c_str())
-                        : "cp -f " + InstallUtil::quote_str(src_shown.c_str()) + " " +
-                              InstallUtil::quote_str(dst_shown.c_str());
+        const std::string shown = fix_cr != 0
+                                      ? "tr -d '\r' <" + InstallUtil::quote_str(src_shown.c_str()) +
+                                            " >" + InstallUtil::quote_str(dst_shown.c_str())
+                                      : "cp -f " + InstallUtil::quote_str(src_shown.c_str()) + " " +
+                                            InstallUtil::quote_str(dst_shown.c_str());
         ZR7_DETAIL("...issuing cmd <%s>", shown.c_str());
     }
     // Only a regular file is copied (a pipe would hold the copy forever, a

@@ -42,6 +42,8 @@ struct Walk {
     const ImageRoot& root;
     unsigned flags;
     const ServerDirGuard& guard;
+    bool check_only;
+    StringList* made;
     std::set<std::pair<dev_t, ino_t>> walked;
 };
 
@@ -61,9 +63,10 @@ int walk(Walk& w, const ImageEntry& src, const std::string& src_shown, int dst_d
         ZR7_ERROR("Error: <%s>: %s", src_shown.c_str(), fs::error_text(error).c_str());
         ZR7_RETURN(-7);
     }
-    const bool server_dir = is_server_dir(w.guard, dst_dir);
+    const bool server_dir = dst_dir >= 0 && is_server_dir(w.guard, dst_dir);
     // Scratch files of a run that was killed; the run lock keeps live runs out.
-    fs::remove_stale_scratch(dst_dir, "zr7copy");
+    if (!w.check_only)
+        fs::remove_stale_scratch(dst_dir, "zr7copy");
     for (const std::string& name : names) {
         const std::string src_path = src_shown + "/" + name;
         const std::string dst_path = dst_shown + name;
@@ -91,7 +94,17 @@ int walk(Walk& w, const ImageEntry& src, const std::string& src_shown, int dst_d
                 ZR7_RETURN(-5);
             }
             fs::UniqueFd sub;
-            if (const int error = fs::make_dir(dst_dir, name, sub)) {
+            int error = 0;
+            if (w.check_only) {
+                struct stat there {};
+                if (dst_dir >= 0 && fs::stat_at(dst_dir, name, there) == 0)
+                    error = fs::open_dir_below(dst_dir, name, sub);
+                else
+                    w.made->push_back(dst_path);
+            } else {
+                error = fs::make_dir(dst_dir, name, sub);
+            }
+            if (error != 0) {
                 ZR7_ERROR("Error: Unable to create directory <%s>", dst_path.c_str());
                 ZR7_ERROR("Error: <%s>: %s", dst_path.c_str(), fs::error_text(error).c_str());
                 ZR7_RETURN(-1);
@@ -101,29 +114,58 @@ int walk(Walk& w, const ImageEntry& src, const std::string& src_shown, int dst_d
             continue;
         }
         if (server_dir && name == "VXAENV" && (w.flags & kCopyOverwrite) != 0 &&
-            w.guard.back_up_env_file) {
+            w.guard.back_up_env_file && !w.check_only) {
             if (const int status = w.guard.back_up_env_file())
                 ZR7_RETURN(status);
         }
         ZR7_DETAIL("processing<%s>", dst_path.c_str());
-        const int status =
-            copy_file_at(entry.fd.get(), entry.st, src_path, dst_dir, name, dst_path, w.flags);
+        const int status = w.check_only ? check_copy_at(entry.fd.get(), entry.st, src_path, dst_dir,
+                                                        name, dst_path)
+                                        : copy_file_at(entry.fd.get(), entry.st, src_path, dst_dir,
+                                                       name, dst_path, w.flags);
         if (status != 0) {
             ZR7_ERROR("Error: Copy src <%s> to dst <%s> failed", src_path.c_str(),
                       dst_path.c_str());
             ZR7_RETURN(status);
         }
-        progress_file_copied(dst_path);
+        if (!w.check_only)
+            progress_file_copied(dst_path);
     }
     ZR7_RETURN(0);
 }
 
 }  // namespace
 
+int check_copy_at(int src_fd, const struct stat& src_st, const std::string& src_shown, int dst_dir,
+                  const std::string& name, const std::string& dst_shown) {
+    ZR7_TRACED("InstallUtil::copy_file");
+    struct stat there {};
+    int error = 0;
+    if (!S_ISREG(src_st.st_mode))
+        error = fs::kNotRegular;
+    else if (src_fd < 0)
+        error = EACCES;
+    else if (dst_dir >= 0 && fs::stat_at(dst_dir, name, there) == 0 && S_ISDIR(there.st_mode))
+        error = EISDIR;
+    if (error == 0)
+        return 0;
+    ZR7_ERROR("Error: <%s>: %s", (error == EISDIR ? dst_shown : src_shown).c_str(),
+              fs::error_text(error).c_str());
+    return -5;
+}
+
+int check_tree(const ImageRoot& root, const ImageEntry& src, const std::string& src_shown,
+               int dst_dir, const std::string& dst_shown, unsigned flags,
+               const ServerDirGuard& guard, StringList& made) {
+    Walk w{root, flags, guard, true, &made, {}};
+    w.walked.insert({src.st.st_dev, src.st.st_ino});
+    return walk(w, src, src_shown, dst_dir, dst_shown);
+}
+
 int copy_tree(const ImageRoot& root, const ImageEntry& src, const std::string& src_shown,
               int dst_dir, const std::string& dst_shown, unsigned flags,
               const ServerDirGuard& guard) {
-    Walk w{root, flags, guard, {}};
+    Walk w{root, flags, guard, false, nullptr, {}};
     w.walked.insert({src.st.st_dev, src.st.st_ino});
     return walk(w, src, src_shown, dst_dir, dst_shown);
 }

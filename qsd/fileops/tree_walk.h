@@ -2,6 +2,7 @@
 // directory of the installation.
 #pragma once
 
+#include <sys/stat.h>
 #include <sys/types.h>
 
 #include <functional>
@@ -36,5 +37,21 @@ int list_names(int dir, StringList& names);
 int copy_tree(const ImageRoot& root, const ImageEntry& src, const std::string& src_shown,
               int dst_dir, const std::string& dst_shown, unsigned flags,
               const ServerDirGuard& guard);
+
+// The same walk changing nothing: it meets what the copy would meet and fails
+// with the same line and status where the copy would, but creates no
+// directory and copies no file. `dst_dir` is -1 for a destination that the
+// copy would create; the directories it would create are added to `made`
+// (shown paths, without the final "/").
+int check_tree(const ImageRoot& root, const ImageEntry& src, const std::string& src_shown,
+               int dst_dir, const std::string& dst_shown, unsigned flags,
+               const ServerDirGuard& guard, StringList& made);
+
+// Whether a copy of the open image file into `name` of `dst_dir` (-1: a
+// directory still to be made) would fail, without copying: a source that is
+// not a readable regular file, a directory in the file's place. 0 or -5,
+// with the copy's lines.
+int check_copy_at(int src_fd, const struct stat& src_st, const std::string& src_shown, int dst_dir,
+                  const std::string& name, const std::string& dst_shown);
 
 }  // namespace zr7

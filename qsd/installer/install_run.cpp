@@ -56,7 +56,9 @@ int Installer610::go() {
     if (seeding == 0)
         ZR7_DETAIL("Seeding disabled");
     CommandList commands = build_command_list(copying != 0, seeding != 0);
-    const int status = process_commands(commands);
+    int status = check_commands(commands);
+    if (status == 0)
+        status = process_commands(commands);
     // What was installed is on the disk before the run reports it.
     sync_written();
     ZR7_RETURN(status);

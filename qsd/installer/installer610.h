@@ -34,6 +34,14 @@ class Installer610 {
     int init(const std::string& src_dir, const std::string& home_dir);
     int go();
     int process_commands(CommandList& commands);
+    // Every command's checks, changing nothing (preflight.cpp): 0, or the
+    // line and status of the command that would fail.
+    int check_commands(const CommandList& commands);
+    int check_architecture();
+    int check_flat_copy(const SimpleCommand& command, const zr7::StringList& made);
+    int check_tree_copy(const SimpleCommand& command, zr7::StringList& made);
+    int check_env_file(const SimpleCommand& command);
+    int check_seed(const SimpleCommand& command);
 
     // Server configuration.
     int read_config(const std::string& home);
