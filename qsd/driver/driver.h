@@ -4,6 +4,7 @@
 
 #include <string>
 
+#include "qsd/platform/progress.h"
 #include "qsd/text/text.h"
 
 namespace zr7 {
@@ -14,8 +15,35 @@ constexpr const char* kOptionString = "c:efh:m:o:sv:V";
 // What main does; returns the process status.
 int run_main(int argc, char** argv);
 
-// The fourteen lines of the usage text on standard error, then exit(-2).
+// The usage text: its fourteen lines, then one line for each option added
+// after them.
+std::string usage_text();
+
+// The usage text on standard error, then exit(-2).
 [[noreturn]] void usage();
+
+// What the command line asks for, judged on its form alone (option letters,
+// arguments present, long options, the operand count) before any option
+// takes effect.
+enum class CommandLineAction { kRun, kHelp, kVersion, kRefuse };
+struct CommandLineCheck {
+    CommandLineAction action = CommandLineAction::kRun;
+    // For kRefuse, what was wrong: "unknown option -x", "option -h needs an
+    // argument", "one src_dir expected, 2 given", ...
+    std::string fault;
+};
+CommandLineCheck check_command_line(int argc, char* const* argv);
+
+// The first trace line of an installing run: version, time, user, working
+// directory and the command line (its pieces joined by blanks).
+std::string run_header_line(const std::string& time_text, const std::string& user_name, long uid,
+                            const std::string& cwd, int argc, char* const* argv);
+
+// The last trace line of an installing run, from its status and progress.
+std::string run_closing_line(int status, const ProgressState& state, double elapsed_seconds);
+
+// The local time as "2026-12-07T01:45:09+0000".
+std::string iso_local_time(long seconds_since_epoch);
 
 // MARLIN_HOME, else MARLINHOME, else "."; always ending in "/".
 std::string get_home_path();

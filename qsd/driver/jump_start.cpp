@@ -3,8 +3,10 @@
 // appended to the log file, waits, and ends with the second run's exit status.
 // The second run is started with an argument vector, so every argument
 // arrives exactly as the user gave it; the command text is only shown.
+#include <fcntl.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <climits>
 #include <cstdio>
 #include <cstring>
@@ -13,6 +15,7 @@
 #include "qsd/fileops/install_util.h"
 #include "qsd/platform/process.h"
 #include "qsd/platform/trace.h"
+#include "qsd/text/escape.h"
 
 namespace zr7 {
 
@@ -59,13 +62,26 @@ std::string own_program(const char* invoked) {
     return std::string(buffer, static_cast<std::size_t>(length));
 }
 
+// Why the log file cannot be opened for appending: the runner says only
+// that it could not, so the open is tried once more for the system's reason
+// (without blocking on a pipe). 0 when it succeeds this time.
+int log_open_error(const std::string& log_file) {
+    const int fd = ::open(log_file.c_str(),
+                          O_WRONLY | O_APPEND | O_CREAT | O_NOCTTY | O_NONBLOCK | O_CLOEXEC, 0666);
+    if (fd < 0)
+        return errno;
+    ::close(fd);
+    return 0;
+}
+
 }  // namespace
 
 int jump_start(int argc, char** argv, const char* home) {
     const std::string log_file = log_file_for(home);
 
     PLT1_PutEnv("VXA_TRC1=ERROR (UNIT:zr7 ALL)");
-    std::printf("Invoking cmd <%s>\n", relaunch_command_text(argc, argv, home).c_str());
+    std::printf("Invoking cmd <%s>\n",
+                escape_controls(relaunch_command_text(argc, argv, home)).c_str());
     std::fflush(stdout);
 
     ProcessSpec job;
@@ -75,14 +91,23 @@ int jump_start(int argc, char** argv, const char* home) {
     job.stdout_mode = OutputMode::kAppend;
 
     const int status = run_process(job);
+    const std::string shown_log = escape_controls(log_file);
     if (status == kRunStdoutFailed) {
-        std::fprintf(stderr, "Error: Can't open <%s>\n", log_file.c_str());
+        const int error = log_open_error(log_file);
+        std::fprintf(stderr, "Error: Can't open <%s>\n", shown_log.c_str());
+        if (error != 0)
+            std::fprintf(stderr, "Error: %s: %s\n", shown_log.c_str(), std::strerror(error));
         return -8;
     }
     if (status < 0) {
-        std::fprintf(stderr, "Error: Can't start <%s>\n", argv[0]);
+        std::fprintf(stderr, "Error: Can't start <%s>\n", escape_controls(argv[0]).c_str());
         return kRelaunchNotStarted;
     }
+    // The installing run's own lines are in the log; a script that sees only
+    // the status learns where to look.
+    if (status != 0)
+        std::fprintf(stderr, "zr7inst: installation failed with exit status <%d>; see <%s>\n",
+                     status & 0xFF, shown_log.c_str());
     return status;
 }
 
