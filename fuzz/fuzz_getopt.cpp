@@ -1,6 +1,8 @@
 // The option parser over any argument vector (arguments cut at NUL bytes):
-// it always ends, never reads past the vector, returns only known letters,
-// and gives an argument exactly to the letters that take one.
+// it always ends, never reads past the vector, returns only known letters
+// (or '-' for a long option, '?' with its reason), and gives an argument
+// exactly to the letters that take one. The whole-line check names a reason
+// exactly when it refuses the line.
 #include <cstring>
 
 #include "fuzz_support.h"
@@ -23,8 +25,18 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     for (char letter = options.next(); letter != 0; letter = options.next()) {
         ZR7_FUZZ_CHECK(++calls <= argc);  // every letter moves the index on
         ZR7_FUZZ_CHECK(options.index <= argc);
-        if (letter == '?')
-            return 0;  // the usage text ends the real run here
+        if (letter == '?') {
+            ZR7_FUZZ_CHECK(!options.fault.empty());
+            break;  // the usage text ends the real run here
+        }
+        ZR7_FUZZ_CHECK(options.fault.empty());
+        if (letter == '-') {
+            // The name after "--" of the element just passed.
+            const char* element = argv[options.index - 1];
+            ZR7_FUZZ_CHECK(element[0] == '-' && element[1] == '-' && element[2] != '\0');
+            ZR7_FUZZ_CHECK(options.argument == element + 2);
+            continue;
+        }
         const char* letter_entry = std::strchr(zr7::kOptionString, letter);
         ZR7_FUZZ_CHECK(letter != ':' && letter_entry != nullptr);
         ZR7_FUZZ_CHECK((letter_entry[1] == ':') == (options.argument != nullptr));
@@ -39,5 +51,8 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
         }
     }
     ZR7_FUZZ_CHECK(options.index <= argc);
+
+    const zr7::CommandLineCheck check = zr7::check_command_line(argc, argv.data());
+    ZR7_FUZZ_CHECK((check.action == zr7::CommandLineAction::kRefuse) == !check.fault.empty());
     return 0;
 }

@@ -2,6 +2,7 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <cstring>
 
 #include "qsd/config/kmsenv_reader.h"
 #include "qsd/fileops/install_util.h"
@@ -33,11 +34,14 @@ int read_kmsenv_file(const std::string& home, std::string& content) {
 
 int Installer610::read_config(const std::string& home) {
     ZR7_OPERATION("Installer610::read_config");
-    const std::string path = home + "/config/.ConfigData/kmsenv";
+    const std::string path =
+        home + (home.empty() || home.back() != '/' ? "/" : "") + "config/.ConfigData/kmsenv";
     std::string content;
     const int error = read_kmsenv_file(home, content);
     if (error != 0) {
         ZR7_ERROR("Error: Can't open kmsenv");
+        // The line above names neither the file nor the reason.
+        ZR7_ERROR("Error: <%s>: %s", path.c_str(), std::strerror(error));
         ZR7_RETURN(error);
     }
     zr7::ServerConfig start{server_name, arch, protocol, port, host_name, family_setting};

@@ -4,6 +4,7 @@
 
 #include <string>
 
+#include "qsd/platform/progress.h"
 #include "qsd/text/text.h"
 
 namespace zr7 {
@@ -14,8 +15,35 @@ constexpr const char* kOptionString = "c:efh:m:o:sv:V";
 // What main does; returns the process status.
 int run_main(int argc, char** argv);
 
-// The fourteen lines of the usage text on standard error, then exit(-2).
+// The usage text: its fourteen lines, then one line for each option added
+// after them.
+std::string usage_text();
+
+// The usage text on standard error, then exit(-2).
 [[noreturn]] void usage();
+
+// What the command line asks for, judged on its form alone (option letters,
+// arguments present, long options, the operand count) before any option
+// takes effect.
+enum class CommandLineAction { kRun, kHelp, kVersion, kRefuse };
+struct CommandLineCheck {
+    CommandLineAction action = CommandLineAction::kRun;
+    // For kRefuse, what was wrong: "unknown option -x", "option -h needs an
+    // argument", "one src_dir expected, 2 given", ...
+    std::string fault;
+};
+CommandLineCheck check_command_line(int argc, char* const* argv);
+
+// The first trace line of an installing run: version, time, user, working
+// directory and the command line (its pieces joined by blanks).
+std::string run_header_line(const std::string& time_text, const std::string& user_name, long uid,
+                            const std::string& cwd, int argc, char* const* argv);
+
+// The last trace line of an installing run, from its status and progress.
+std::string run_closing_line(int status, const ProgressState& state, double elapsed_seconds);
+
+// The local time as "2026-12-07T01:45:09+0000".
+std::string iso_local_time(long seconds_since_epoch);
 
 // MARLIN_HOME, else MARLINHOME, else "."; always ending in "/".
 std::string get_home_path();
@@ -36,6 +64,14 @@ std::string relaunch_command_text(int argc, char** argv, const std::string& home
 // The arguments of the second run: "-o", the log directory, then argv[1] to
 // argv[argc-1] exactly as given (blanks and empty arguments included).
 StringList relaunch_arguments(int argc, char** argv, const std::string& home);
+
+// src_dir + "MSRV", with a "/" between where src_dir lacks one.
+std::string image_msrv_path(const std::string& src_dir);
+
+// The first invocation's checks before the relaunch: the installation
+// directory, the image's MSRV directory and the log directory exist. 0, or
+// -7 / -8 after a line on standard error.
+int check_before_relaunch(const std::string& home, const std::string& src_dir);
 
 // Exit status when the second run cannot be started at all, the status a
 // shell gives a command it cannot find.

@@ -2,6 +2,7 @@
 
 #include "qsd/driver/driver.h"
 #include "qsd/platform/trace.h"
+#include "qsd/text/escape.h"
 #include "qsd/text/text.h"
 
 namespace zr7 {
@@ -10,10 +11,10 @@ std::string get_home_path() {
     std::string home;
     const char* value = PLT1_GetEnv("MARLIN_HOME", nullptr);
     if (value != nullptr && *value != '\0') {
-        std::printf("MARLIN_HOME is <%s>\n", value);
+        std::printf("MARLIN_HOME is <%s>\n", escape_controls(value).c_str());
         home = value;
     } else if ((value = PLT1_GetEnv("MARLINHOME", nullptr)) != nullptr && *value != '\0') {
-        std::printf("MARLINHOME is <%s>\n", value);
+        std::printf("MARLINHOME is <%s>\n", escape_controls(value).c_str());
         home = value;
     } else {
         std::printf("No MARLIN_HOME or MARLINHOME found.  Defaulting to .");

@@ -3,8 +3,10 @@
 // appended to the log file, waits, and ends with the second run's exit status.
 // The second run is started with an argument vector, so every argument
 // arrives exactly as the user gave it; the command text is only shown.
+#include <fcntl.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <climits>
 #include <cstdio>
 #include <cstring>
@@ -14,6 +16,7 @@
 #include "qsd/platform/fs.h"
 #include "qsd/platform/process.h"
 #include "qsd/platform/trace.h"
+#include "qsd/text/escape.h"
 
 namespace zr7 {
 
@@ -77,14 +80,17 @@ int jump_start(int argc, char** argv, const char* home) {
     const std::string log_file = log_file_for(home);
 
     PLT1_PutEnv("VXA_TRC1=ERROR (UNIT:zr7 ALL)");
-    std::printf("Invoking cmd <%s>\n", relaunch_command_text(argc, argv, home).c_str());
+    std::printf("Invoking cmd <%s>\n",
+                escape_controls(relaunch_command_text(argc, argv, home)).c_str());
     std::fflush(stdout);
 
     // The log lies in the server's directory: opened by the link rule,
     // refused when it is not a regular file, never waited on.
+    const std::string shown_log = escape_controls(log_file);
     fs::UniqueFd log_fd;
-    if (open_log(home, log_fd) != 0) {
-        std::fprintf(stderr, "Error: Can't open <%s>\n", log_file.c_str());
+    if (const int error = open_log(home, log_fd)) {
+        std::fprintf(stderr, "Error: Can't open <%s>\n", shown_log.c_str());
+        std::fprintf(stderr, "Error: <%s>: %s\n", shown_log.c_str(), fs::error_text(error).c_str());
         return -8;
     }
     ProcessSpec job;
@@ -95,9 +101,14 @@ int jump_start(int argc, char** argv, const char* home) {
 
     const int status = run_process(job);
     if (status < 0) {
-        std::fprintf(stderr, "Error: Can't start <%s>\n", argv[0]);
+        std::fprintf(stderr, "Error: Can't start <%s>\n", escape_controls(argv[0]).c_str());
         return kRelaunchNotStarted;
     }
+    // The installing run's own lines are in the log; a script that sees only
+    // the status learns where to look.
+    if (status != 0)
+        std::fprintf(stderr, "zr7inst: installation failed with exit status <%d>; see <%s>\n",
+                     status & 0xFF, shown_log.c_str());
     return status;
 }
 

@@ -1,13 +1,18 @@
+#include <pwd.h>
 #include <unistd.h>
 
+#include <chrono>
+#include <climits>
 #include <cstdio>
 #include <cstring>
+#include <ctime>
 
 #include "qsd/driver/driver.h"
 #include "qsd/driver/getopt.h"
 #include "qsd/installer/installer610.h"
 #include "qsd/platform/progress.h"
 #include "qsd/platform/trace.h"
+#include "qsd/text/escape.h"
 
 namespace zr7 {
 
@@ -21,14 +26,41 @@ int finish(const TraceScope& zr7_trace, TRC1_Unit& zr7_unit, int status) {
     return status;
 }
 
+// A refusal of an option's value, on standard error, the value escaped: it
+// may hold the very bytes it is refused for.
+void refuse_value(const char* what, const char* value) {
+    std::fflush(stdout);
+    std::fprintf(stderr, "Error: %s %s\n", what, escape_controls(value).c_str());
+}
+
+std::string user_name(uid_t uid) {
+    struct passwd entry {};
+    struct passwd* found = nullptr;
+    char buffer[4096];
+    if (::getpwuid_r(uid, &entry, buffer, sizeof buffer, &found) == 0 && found != nullptr)
+        return found->pw_name;
+    return "?";
+}
+
+std::string working_directory() {
+    char buffer[PATH_MAX];
+    return ::getcwd(buffer, sizeof buffer) != nullptr ? buffer : "?";
+}
+
+double seconds_since(std::chrono::steady_clock::time_point start) {
+    return std::chrono::duration<double>(std::chrono::steady_clock::now() - start).count();
+}
+
 }  // namespace
 
 int run_main(int argc, char** argv) {
     ZR7_OPERATION("main");
+    const auto started = std::chrono::steady_clock::now();
     Installer610 installer;
     std::string home;
     std::string source;
     int relaunched = 0;
+    bool env_options = false;  // -c or -m given
     GetOpt options(argc, argv, kOptionString);
 
     if (argc == 2 && std::strcmp(argv[1], "-V") == 0) {
@@ -36,12 +68,33 @@ int run_main(int argc, char** argv) {
         ZR7_RETURN(0);
     }
 
+    // The form of the whole line first: a mistyped line does nothing at all.
+    const CommandLineCheck check = check_command_line(argc, argv);
+    switch (check.action) {
+        case CommandLineAction::kHelp:
+            std::fputs(usage_text().c_str(), stdout);
+            std::fflush(stdout);
+            ZR7_RETURN(0);
+        case CommandLineAction::kVersion:
+            std::printf("%s version %s\n", escape_controls(argv[0]).c_str(), kVrmf);
+            std::fflush(stdout);
+            ZR7_RETURN(0);
+        case CommandLineAction::kRefuse:
+            std::fflush(stdout);
+            std::fprintf(stderr, "zr7inst: %s\n", escape_controls(check.fault).c_str());
+            usage();
+        case CommandLineAction::kRun:
+            break;
+    }
+
     for (char letter = options.next(); letter != 0; letter = options.next()) {
         switch (letter) {
             case 'c':
-                if (installer.addVar(options.argument) != 0) {
-                    std::fflush(stdout);
-                    std::fprintf(stderr, "Error: Bad env var %s\n", options.argument);
+                // A line break or another control byte would end up in VXAENV
+                // as a line of its own, or in the log as one.
+                env_options = true;
+                if (has_control_byte(options.argument) || installer.addVar(options.argument) != 0) {
+                    refuse_value("Bad env var", options.argument);
                     ZR7_RETURN(finish(zr7_trace, zr7_unit, -2));
                 }
                 break;
@@ -54,6 +107,11 @@ int run_main(int argc, char** argv) {
                 home = options.argument;
                 break;
             case 'm':
+                env_options = true;
+                if (has_control_byte(options.argument)) {
+                    refuse_value("Bad module name", options.argument);
+                    ZR7_RETURN(finish(zr7_trace, zr7_unit, -2));
+                }
                 installer.module_name = options.argument;
                 break;
             case 'o':
@@ -66,22 +124,18 @@ int run_main(int argc, char** argv) {
             case 'v':
                 if (std::strcmp(options.argument, "610") != 0) {
                     std::fflush(stdout);
-                    std::fprintf(stderr, "Error: Version %s not supported\n", options.argument);
+                    std::fprintf(stderr, "Error: Version %s not supported\n",
+                                 escape_controls(options.argument).c_str());
                     ZR7_RETURN(finish(zr7_trace, zr7_unit, -2));
                 }
                 break;
             case 'V':
-                std::printf("%s version %s\n", argv[0], kVrmf);
+                std::printf("%s version %s\n", escape_controls(argv[0]).c_str(), kVrmf);
                 break;
             default:
-                usage();
+                usage();  // check_command_line has refused every other form
         }
     }
-
-    // Exactly one operand, and not an empty one: "" would install from a
-    // directory nobody named.
-    if (argc - options.index != 1 || argv[options.index][0] == '\0')
-        usage();
 
     if (home.empty())
         home = get_home_path();
@@ -89,18 +143,34 @@ int run_main(int argc, char** argv) {
         home += '/';
 
     if (relaunched == 0) {
-        const int status = jump_start(argc, argv, home.c_str());
+        int status = check_before_relaunch(home, argv[options.index]);
+        if (status == 0)
+            status = jump_start(argc, argv, home.c_str());
         ZR7_RETURN(status);
     }
 
-    // The installing invocation: a progress line for a watching terminal.
+    // The installing invocation: its errors also reach the first
+    // invocation's standard error, and a watching terminal gets progress.
+    trace_echo_errors(true);
     progress_enable(progress_wanted(::isatty(STDERR_FILENO) == 1, ::isatty(STDOUT_FILENO) == 1));
+    const std::string log_file = installer.log_dir + "qsdinst.log";
 
     if (zr7_trace.detail()) {
+        ZR7_DETAIL("%s", run_header_line(iso_local_time(static_cast<long>(std::time(nullptr))),
+                                         user_name(::geteuid()), static_cast<long>(::geteuid()),
+                                         working_directory(), argc, argv)
+                             .c_str());
         ZR7_DETAIL("Parameters begin-----------------");
         for (int i = 1; i < argc; ++i)
             ZR7_DETAIL("....<%s>", argv[i]);
         ZR7_DETAIL("Parameters end ------------------");
+    }
+    if (installer.copying == 0 && env_options) {
+        static const char kSkipped[] =
+            "Warning: -s skips the VXAENV update; -c and -m are not applied";
+        std::fflush(stdout);
+        std::fprintf(stderr, "%s\n", kSkipped);
+        ZR7_DETAIL("%s", kSkipped);
     }
 
     source = argv[options.index];
@@ -114,17 +184,17 @@ int run_main(int argc, char** argv) {
         std::fflush(stdout);
         status = installer.go();
     }
-    progress_finish(status);
+    progress_finish(status, log_file, seconds_since(started));
     status = finish(zr7_trace, zr7_unit, status);
     // Standard output is the log, the run's record. When some of it could
     // not be written (a full disk), the run says so where it still can and
     // does not end as a success.
     if (std::ferror(stdout) != 0) {
-        std::fprintf(stderr, "Error: Can't write <%s>\n",
-                     (installer.log_dir + "qsdinst.log").c_str());
+        std::fprintf(stderr, "Error: Can't write <%s>\n", escape_controls(log_file).c_str());
         if (status == 0)
             status = -8;
     }
+    ZR7_DETAIL("%s", run_closing_line(status, progress_state(), seconds_since(started)).c_str());
     ZR7_RETURN(status);
 }
 

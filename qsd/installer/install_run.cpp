@@ -1,3 +1,4 @@
+#include "qsd/config/names.h"
 #include "qsd/fileops/install_util.h"
 #include "qsd/installer/installer610.h"
 #include "qsd/platform/directory_lock.h"
@@ -10,11 +11,14 @@ int Installer610::init(const std::string& src_dir, const std::string& home_dir) 
     home_path = home_dir.empty() ? "./" : home_dir;
     (void)open_home();
     int status = read_config(home_path);
-    // The server name and the architecture name directories: a NUL byte read
-    // from kmsenv would cut such a path short and name another directory.
-    if (status == 0 &&
-        (server_name.find('\0') != std::string::npos || arch.find('\0') != std::string::npos)) {
-        ZR7_ERROR("Error: Server name or architecture in kmsenv holds a NUL byte");
+    // The server name and the architecture name directories under the home:
+    // "..", a "/" or a control byte would reach another directory or break
+    // a line of the log. An empty architecture is left to the copies.
+    if (status == 0 && !zr7::is_safe_directory_name(server_name)) {
+        ZR7_ERROR_TEXT("Error: Bad server name <" + server_name + ">");
+        status = -1;
+    } else if (status == 0 && !zr7::is_safe_directory_name(arch)) {
+        ZR7_ERROR_TEXT("Error: Bad architecture <" + arch + ">");
         status = -1;
     }
     if (status == 0) {

@@ -169,7 +169,14 @@ std::string progress_line(const ProgressState& state, std::size_t width) {
     return line;
 }
 
-std::string progress_summary(const ProgressState& state, int status) {
+std::string elapsed_text(double seconds) {
+    char text[32];
+    std::snprintf(text, sizeof text, "%.3f", seconds < 0 ? 0.0 : seconds);
+    return text;
+}
+
+std::string progress_summary(const ProgressState& state, int status, const std::string& log_file,
+                             double elapsed_seconds) {
     std::string text;
     if (status == 0) {
         text = "zr7inst: installation done\n";
@@ -190,6 +197,8 @@ std::string progress_summary(const ProgressState& state, int status) {
     } else {
         text += "  VXAENV: changed, backup " + terminal_safe(state.backup) + "\n";
     }
+    text += "  log: " + terminal_safe(log_file) + "\n";
+    text += "  elapsed: " + elapsed_text(elapsed_seconds) + " s\n";
     return text;
 }
 
@@ -243,14 +252,18 @@ void progress_env_result(bool changed, const std::string& backup_path) {
     run.backup = backup_path;
 }
 
-void progress_finish(int status) {
+const ProgressState& progress_state() {
+    return display().run;
+}
+
+void progress_finish(int status, const std::string& log_file, double elapsed_seconds) {
     Display& d = display();
     if (!d.on)
         return;
     std::string text;
     if (d.drawn_width > 0)
         text = "\r" + std::string(d.drawn_width, ' ') + "\r";
-    text += progress_summary(d.run, status);
+    text += progress_summary(d.run, status, log_file, elapsed_seconds);
     std::fputs(text.c_str(), stderr);
     std::fflush(stderr);
     d.drawn.clear();

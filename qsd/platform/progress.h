@@ -21,8 +21,9 @@ void progress_file_copied(const std::string& destination);
 void progress_seeding(const std::string& file_name);
 void progress_seeded(const std::string& file_name);
 void progress_env_result(bool changed, const std::string& backup_path);
-// Clears the progress line and writes the summary of the run.
-void progress_finish(int status);
+// Clears the progress line and writes the summary of the run, which names
+// the log file and the time the run took.
+void progress_finish(int status, const std::string& log_file, double elapsed_seconds);
 
 // What the display knows about the run so far.
 struct ProgressState {
@@ -38,12 +39,20 @@ struct ProgressState {
     std::string backup;
 };
 
+// The run so far, whether or not it is shown: the counts also go into the
+// log's closing line.
+const ProgressState& progress_state();
+
+// Seconds with three decimals, "12.345".
+std::string elapsed_text(double seconds);
+
 // The progress line for a terminal `width` columns wide, at most width - 1
 // columns so that it never wraps. Every byte of a name that a terminal could
 // take for a control is shown as "?".
 std::string progress_line(const ProgressState& state, std::size_t width);
 // The closing summary, lines ending in "\n".
-std::string progress_summary(const ProgressState& state, int status);
+std::string progress_summary(const ProgressState& state, int status, const std::string& log_file,
+                             double elapsed_seconds);
 // The text with control bytes, C1 controls and bytes that are not UTF-8
 // replaced by "?", so a file name cannot move the cursor or retitle a window.
 std::string terminal_safe(const std::string& text);

@@ -10,6 +10,7 @@
 #include <string>
 #include <vector>
 
+#include "qsd/text/escape.h"
 #include "qsd/text/text.h"
 
 namespace zr7 {
@@ -132,6 +133,26 @@ long current_pid() {
     return g_pid;
 }
 
+bool g_echo_errors = false;
+
+// Whether a byte must be escaped in a line of the log.
+bool needs_escape(char c) {
+    return c == '\\' || is_control_byte(c);
+}
+
+// The message as one line: a name with a line break cannot forge another
+// line of the log, and no byte reaches a terminal as a command. Most
+// messages hold no such byte and are appended as they are.
+void append_escaped(std::string& out, const char* message, std::size_t length) {
+    for (std::size_t i = 0; i < length; ++i) {
+        if (needs_escape(message[i])) {
+            out += escape_controls(std::string(message, length));
+            return;
+        }
+    }
+    out.append(message, length);
+}
+
 // With every class on, the installing run writes some ten lines for each
 // file it copies. The head of a line, "(2026-12-06 18:30:32 pid 4242 ",
 // changes at most once a second, so it is kept and made again only when the
@@ -160,7 +181,7 @@ void write_line(const TRC1_Unit* unit, int line, const char* message, std::size_
     out.assign(head);
     out += unit->name;
     out.append(number, digits > 0 ? static_cast<std::size_t>(digits) : 0);
-    out.append(message, length);
+    append_escaped(out, message, length);
     out += '\n';
     std::fwrite(out.data(), 1, out.size(), stdout);
     std::fflush(stdout);
@@ -168,6 +189,45 @@ void write_line(const TRC1_Unit* unit, int line, const char* message, std::size_
 
 void write_line(const TRC1_Unit* unit, int line, const std::string& message) {
     write_line(unit, line, message.data(), message.size());
+}
+
+// An error line of the installing run also goes to standard error, which is
+// the first invocation's, so whoever started the tool sees why it failed.
+void echo_error(const char* message, std::size_t length) {
+    static const char kMark[] = "Error:";
+    if (!g_echo_errors || length < sizeof kMark - 1 ||
+        std::string(message, sizeof kMark - 1) != kMark)
+        return;
+    std::string out;
+    append_escaped(out, message, length);
+    out += '\n';
+    std::fflush(stdout);
+    std::fwrite(out.data(), 1, out.size(), stderr);
+    std::fflush(stderr);
+}
+
+// Formats a trace message and writes it, and echoes it when it is an error.
+void write_formatted(TRC1_Unit* unit, int line, bool error, const char* format, va_list args) {
+    // Formatted once into a buffer on the stack; only a longer line is
+    // formatted a second time, into one of its size.
+    char buffer[1024];
+    va_list again;
+    va_copy(again, args);
+    const int size = std::vsnprintf(buffer, sizeof buffer, format, args);
+    if (size <= 0) {
+        write_line(unit, line, "", 0);
+    } else if (static_cast<std::size_t>(size) < sizeof buffer) {
+        write_line(unit, line, buffer, static_cast<std::size_t>(size));
+        if (error)
+            echo_error(buffer, static_cast<std::size_t>(size));
+    } else {
+        std::vector<char> larger(static_cast<std::size_t>(size) + 1);
+        std::vsnprintf(larger.data(), larger.size(), format, again);
+        write_line(unit, line, larger.data(), static_cast<std::size_t>(size));
+        if (error)
+            echo_error(larger.data(), static_cast<std::size_t>(size));
+    }
+    va_end(again);
 }
 
 }  // namespace
@@ -203,26 +263,32 @@ void TRC1_Event(TRC1_Unit* unit, int line, int kind, int status) {
 }
 
 void TRC1_Printf(TRC1_Unit* unit, int line, const char* format, ...) {
-    // Formatted once into a buffer on the stack; only a longer line is
-    // formatted a second time, into one of its size.
-    char buffer[1024];
     va_list args;
     va_start(args, format);
-    va_list again;
-    va_copy(again, args);
-    const int size = std::vsnprintf(buffer, sizeof buffer, format, args);
+    zr7::write_formatted(unit, line, false, format, args);
     va_end(args);
-    if (size <= 0) {
-        zr7::write_line(unit, line, "", 0);
-    } else if (static_cast<std::size_t>(size) < sizeof buffer) {
-        zr7::write_line(unit, line, buffer, static_cast<std::size_t>(size));
-    } else {
-        std::vector<char> larger(static_cast<std::size_t>(size) + 1);
-        std::vsnprintf(larger.data(), larger.size(), format, again);
-        zr7::write_line(unit, line, larger.data(), static_cast<std::size_t>(size));
-    }
-    va_end(again);
 }
+
+void TRC1_Error(TRC1_Unit* unit, int line, const char* format, ...) {
+    va_list args;
+    va_start(args, format);
+    zr7::write_formatted(unit, line, true, format, args);
+    va_end(args);
+}
+
+namespace zr7 {
+
+void trace_text(TRC1_Unit* unit, int line, bool error, const std::string& message) {
+    write_line(unit, line, message);
+    if (error)
+        echo_error(message.data(), message.size());
+}
+
+void trace_echo_errors(bool on) {
+    g_echo_errors = on;
+}
+
+}  // namespace zr7
 
 const char* PLT1_GetEnv(const char* name, const char* /*unused*/) {
     return name == nullptr ? nullptr : std::getenv(name);

@@ -13,6 +13,9 @@
 //
 // Trace lines go to standard output, one flushed line each:
 //   (2026-12-06 18:30:32 pid 4242 zr7.main:120) message
+// In the message every byte below 0x20, 0x7f and the backslash are written
+// as escapes (qsd/text/escape.h), so that a name cannot break a line of the
+// log or send a terminal a command.
 #pragma once
 
 #include <string>
@@ -38,6 +41,11 @@ unsigned TRC1_Sync(TRC1_Unit* unit);
 void TRC1_Event(TRC1_Unit* unit, int line, int kind, int status = 0);
 void TRC1_Printf(TRC1_Unit* unit, int line, const char* format, ...)
     __attribute__((format(printf, 3, 4)));
+// An error-class line: as TRC1_Printf, and when errors are echoed (see
+// zr7::trace_echo_errors) a message beginning with "Error:" also goes to
+// standard error, escaped the same way.
+void TRC1_Error(TRC1_Unit* unit, int line, const char* format, ...)
+    __attribute__((format(printf, 3, 4)));
 
 // Returns the variable's value or null. The second argument is unused.
 const char* PLT1_GetEnv(const char* name, const char* unused);
@@ -53,6 +61,14 @@ unsigned trace_flags_for(const std::string& setting, const std::string& unit_nam
 // Replaces the setting read from VXA_TRC1 (tests, and nothing else). Moves
 // the sync counter so every unit refreshes its cache.
 void trace_reconfigure(const std::string& setting);
+
+// Writes a message that is already a whole text (it may hold NUL bytes,
+// which a format would cut short); `error` as for TRC1_Error.
+void trace_text(TRC1_Unit* unit, int line, bool error, const std::string& message);
+
+// The installing run turns this on: its standard error is the first
+// invocation's, where the administrator or a script looks for failures.
+void trace_echo_errors(bool on);
 
 // The program-wide sync counter; starts at 1, so a fresh record (0) syncs.
 extern unsigned g_trace_sync;
@@ -98,10 +114,17 @@ class TraceScope {
             TRC1_Printf(&zr7_unit, __LINE__, __VA_ARGS__); \
         }                                                  \
     } while (0)
-#define ZR7_ERROR(...)                                     \
-    do {                                                   \
-        if (zr7_trace.error()) {                           \
-            TRC1_Printf(&zr7_unit, __LINE__, __VA_ARGS__); \
-        }                                                  \
+#define ZR7_ERROR(...)                                    \
+    do {                                                  \
+        if (zr7_trace.error()) {                          \
+            TRC1_Error(&zr7_unit, __LINE__, __VA_ARGS__); \
+        }                                                 \
+    } while (0)
+// An error line from a whole text.
+#define ZR7_ERROR_TEXT(message)                                    \
+    do {                                                           \
+        if (zr7_trace.error()) {                                   \
+            zr7::trace_text(&zr7_unit, __LINE__, true, (message)); \
+        }                                                          \
     } while (0)
 #define ZR7_RETURN(status) return zr7_trace.exit(__LINE__, (status))

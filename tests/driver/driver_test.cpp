@@ -1,6 +1,7 @@
 // The option parser, and the command text the relaunch shows.
 #include <gtest/gtest.h>
 
+#include <regex>
 #include <string>
 #include <tuple>
 #include <vector>
@@ -23,19 +24,28 @@ struct Argv {
     std::vector<char*> pointers;
 };
 
-// Each option as "e", "h=/x" (with its argument) or "?" (refused, which ends
-// the parse), then the index of the first operand.
+// Each option as "e", "h=/x" (with its argument), "-=name" (a long option)
+// or "?(fault)" (refused, which ends the parse), then the index of the first
+// operand.
 TEST(GetOpt, LettersArgumentsAndFirstOperand) {
     const std::pair<std::vector<std::string>, std::string> cases[] = {
         {{}, "1"},
         {{"-e", "-s", "/img"}, "e s 3"},
         {{"-h/opt/srv", "/img"}, "h=/opt/srv 2"},
         {{"-h", "", "-h", "-e"}, "h= h=-e 5"},
-        {{"-h"}, "? 2"},
-        {{"-x", "/img"}, "? 1"},
+        {{"-h"}, "?(option -h needs an argument) 2"},
+        {{"-e", "-v"}, "e ?(option -v needs an argument) 3"},
+        {{"-x", "/img"}, "?(unknown option -x) 1"},
+        {{"-xyz", "/img"}, "?(unknown option -x) 1"},
+        {{"-:", "/img"}, "?(unknown option -:) 1"},
         {{"-es", "/img"}, "e 2"},
         {{"--", "-e"}, "2"},
-        {{"--anything", "/img"}, "2"},
+        {{"--", "--help"}, "2"},
+        {{"--anything", "/img"}, "-=anything 2"},
+        {{"-e", "--help", "/img"}, "e -=help 3"},
+        {{"--version"}, "-=version 2"},
+        {{"-h", "--help", "/img"}, "h=--help 3"},
+        {{"---", "/img"}, "-=- 2"},
         {{"-", "/img"}, "2"},
         {{"/img", "-e"}, "1"},
         {{"-c", "a=b", "-V", "-o", "/l/", "-v", "610", "-f", "-m", "x"},
@@ -48,12 +58,102 @@ TEST(GetOpt, LettersArgumentsAndFirstOperand) {
         std::string got;
         for (char letter = options.next(); letter != 0; letter = options.next()) {
             got += letter + std::string(options.argument ? "=" : "") +
-                   (options.argument ? options.argument : "") + " ";
+                   (options.argument ? options.argument : "") +
+                   (letter == '?' ? "(" + options.fault + ")" : "") + " ";
             if (letter == '?')
                 break;
         }
         EXPECT_EQ(got + std::to_string(options.index), expected);
     }
+}
+
+// The form of a command line decides, before anything is done, whether the
+// run goes on, prints the usage or the version, or is refused and why.
+TEST(CheckCommandLine, RunHelpVersionOrRefusalWithItsReason) {
+    using A = zr7::CommandLineAction;
+    const std::tuple<std::vector<std::string>, A, std::string> cases[] = {
+        {{"/img"}, A::kRun, ""},
+        {{"-c", "K=v", "-m", "mod", "-e", "-s", "-f", "-h", "/h", "-v", "610", "-V", "/img"},
+         A::kRun,
+         ""},
+        {{"--", "/img"}, A::kRun, ""},
+        {{"-", "/img"}, A::kRun, ""},
+        {{"-o", "/l/", "/img"}, A::kRun, ""},
+        {{"--help"}, A::kHelp, ""},
+        {{"-e", "--help", "/a", "/b"}, A::kHelp, ""},
+        {{"--version"}, A::kVersion, ""},
+        {{"-V", "--version", "/img"}, A::kVersion, ""},
+        {{"--help", "--version"}, A::kHelp, ""},
+        {{}, A::kRefuse, "one src_dir expected, 0 given"},
+        {{"-e"}, A::kRefuse, "one src_dir expected, 0 given"},
+        {{"/img", "/other"}, A::kRefuse, "one src_dir expected, 2 given"},
+        {{"/img", "-e"}, A::kRefuse, "one src_dir expected, 2 given"},
+        {{"--", "/img", "--help"}, A::kRefuse, "one src_dir expected, 2 given"},
+        {{""}, A::kRefuse, "src_dir is empty"},
+        {{"-x", "/img"}, A::kRefuse, "unknown option -x"},
+        {{"-h"}, A::kRefuse, "option -h needs an argument"},
+        {{"-:", "/img"}, A::kRefuse, "unknown option -:"},
+        {{"--dry-run", "/img"}, A::kRefuse, "unknown option --dry-run"},
+        {{"--help=x", "/img"}, A::kRefuse, "unknown option --help=x"},
+        {{"--HELP"}, A::kRefuse, "unknown option --HELP"},
+        {{"-x", "--help"}, A::kRefuse, "unknown option -x"},
+        {{"--he\nlp", "/img"}, A::kRefuse, "unknown option --he\nlp"}};
+    for (const auto& [args, action, fault] : cases) {
+        std::vector<std::string> texts{"zr7inst"};
+        texts.insert(texts.end(), args.begin(), args.end());
+        Argv argv(texts);
+        const zr7::CommandLineCheck check =
+            zr7::check_command_line(argv.argc(), argv.pointers.data());
+        EXPECT_EQ(static_cast<int>(check.action), static_cast<int>(action))
+            << testing::PrintToString(args);
+        EXPECT_EQ(check.fault, fault) << testing::PrintToString(args);
+    }
+}
+
+// The fourteen lines of old stay first and whole; added options follow.
+TEST(UsageText, FourteenLinesThenTheAddedOptions) {
+    const std::string text = zr7::usage_text();
+    EXPECT_EQ(text.substr(0, 84),
+              "Usage: zr7inst [-c key=val] [-e] [-f] [-h home] [-m mod] [-s] "
+              "[-v ver] [-V] src_dir\n");
+    std::vector<std::string> lines;
+    for (std::size_t at = 0, end; (end = text.find('\n', at)) != std::string::npos; at = end + 1)
+        lines.push_back(text.substr(at, end - at));
+    ASSERT_EQ(lines.size(), 16u);
+    EXPECT_EQ(lines[13], "           only option, exit right away.");
+    EXPECT_EQ(lines[14].rfind("  --help   ", 0), 0u);
+    EXPECT_EQ(lines[15].rfind("  --version ", 0), 0u);
+    EXPECT_EQ(text.back(), '\n');
+}
+
+// The log's first and last lines of a run.
+TEST(RunRecord, HeaderAndClosingLines) {
+    Argv argv({"/bin/zr7inst", "-o", "/s/logs/", "-m", "a b", "/img"});
+    EXPECT_EQ(zr7::run_header_line("2026-12-07T01:02:03+0100", "root", 0, "/srv", argv.argc(),
+                                   argv.pointers.data()),
+              "zr7inst 06100400 run begins: time 2026-12-07T01:02:03+0100, user root(0), cwd /srv, "
+              "command /bin/zr7inst -o /s/logs/ -m a b /img");
+    zr7::ProgressState state;
+    state.files_copied = 12;
+    state.files_seeded = 2;
+    const std::tuple<bool, bool, int, double, std::string> cases[] = {
+        {false, false, 0, 1.2344,
+         "rc 0, files copied 12, files seeded 2, VXAENV not updated, "
+         "elapsed 1.234 s"},
+        {true, false, -5, 0.0,
+         "rc -5, files copied 12, files seeded 2, VXAENV unchanged, "
+         "elapsed 0.000 s"},
+        {true, true, -6, 61.5,
+         "rc -6, files copied 12, files seeded 2, VXAENV changed, "
+         "elapsed 61.500 s"}};
+    for (const auto& [reported, changed, status, seconds, text] : cases) {
+        state.env_reported = reported;
+        state.env_changed = changed;
+        EXPECT_EQ(zr7::run_closing_line(status, state, seconds), "zr7inst run ends: " + text);
+    }
+    EXPECT_TRUE(std::regex_match(zr7::iso_local_time(0),
+                                 std::regex(R"(19(69|70)-\d\d-\d\dT\d\d:\d\d:\d\d[+-]\d{4})")))
+        << zr7::iso_local_time(0);
 }
 
 // Shown only: the tool's path bare, a piece with white space in double quotes.

@@ -1,6 +1,8 @@
 // The command line of the built tool (usage, version, refusals, the home
 // directory), what an install from the build puts in place, and the
 // stand-in loader's own checks.
+#include <algorithm>
+#include <filesystem>
 #include <map>
 
 #include "e2e/e2e.h"
@@ -22,14 +24,57 @@ const char* const kUsage =
     "  -v ver   Version of the source image.  Currently only\n"
     "           610 is supported.  Default is 610.\n"
     "  -V       Print out version as vvrrmmff.  If this is the\n"
-    "           only option, exit right away.\n";
+    "           only option, exit right away.\n"
+    "  --help   Print this text on standard output and exit.\n"
+    "  --version Print the version line on standard output and exit.\n";
 
-TEST(CommandLine, BadOnesGiveTheUsageAndStatus254) {
-    const std::vector<std::string> cases[] = {
-        {}, {"-x", "/img"}, {"-h"}, {"/img", "/other"}, {"/img", "-e"}, {"-:", "/img"}, {""}};
-    for (const std::vector<std::string>& args : cases) {
+// Every entry under a directory with its kind and content, for "nothing changed".
+std::string tree_snapshot(const std::string& root) {
+    std::string text;
+    std::vector<std::string> entries;
+    for (const auto& entry : std::filesystem::recursive_directory_iterator(root))
+        entries.push_back(entry.path().string());
+    std::sort(entries.begin(), entries.end());
+    for (const std::string& path : entries) {
+        const bool file = std::filesystem::is_regular_file(std::filesystem::symlink_status(path));
+        text += path + (file ? " " + read_file(path) : " -") + "\n";
+    }
+    return text;
+}
+
+// One line says what was wrong, then the usage text; nothing on standard output.
+TEST(CommandLine, BadOnesGiveTheReasonTheUsageAndStatus254) {
+    const std::pair<std::vector<std::string>, std::string> cases[] = {
+        {{}, "one src_dir expected, 0 given"},
+        {{"-e", "-s"}, "one src_dir expected, 0 given"},
+        {{"-x", "/img"}, "unknown option -x"},
+        {{"-h"}, "option -h needs an argument"},
+        {{"/img", "/other"}, "one src_dir expected, 2 given"},
+        {{"/img", "-e"}, "one src_dir expected, 2 given"},
+        {{"-:", "/img"}, "unknown option -:"},
+        {{""}, "src_dir is empty"},
+        {{"--dry-run", "/img"}, "unknown option --dry-run"},
+        {{"--anything", "/img"}, "unknown option --anything"},
+        {{"-V", "--he\033lp", "/img"}, "unknown option --he\\x1blp"},
+        {{"-c", "A=1", "-x", "/img"}, "unknown option -x"}};
+    for (const auto& [args, fault] : cases) {
         const RunResult r = tool(args);
-        EXPECT_EQ(std::to_string(r.exit_code) + r.err, "254" + std::string(kUsage))
+        EXPECT_EQ(std::to_string(r.exit_code) + r.out + r.err,
+                  "254zr7inst: " + fault + "\n" + std::string(kUsage))
+            << testing::PrintToString(args);
+    }
+}
+
+// --help and --version answer on standard output, do nothing else and end with 0.
+TEST(CommandLine, HelpAndVersionOnStandardOutput) {
+    const std::pair<std::vector<std::string>, std::string> cases[] = {
+        {{"--help"}, kUsage},
+        {{"-e", "--help", "/a", "/b"}, kUsage},
+        {{"--version"}, tool_path() + " version 06100400\n"},
+        {{"-c", "bad", "--version", "/img"}, tool_path() + " version 06100400\n"}};
+    for (const auto& [args, out] : cases) {
+        const RunResult r = tool(args);
+        EXPECT_EQ(std::to_string(r.exit_code) + r.out + r.err, "0" + out)
             << testing::PrintToString(args);
     }
 }
@@ -59,9 +104,19 @@ TEST(CommandLine, VersionRefusalsHomeAndTheRelaunchLine) {
         {{}, {{"MARLINHOME", "."}}, 0, "MARLINHOME is <.>\n" + cmd(), ""},
         {{}, {}, 0, "No MARLIN_HOME or MARLINHOME found.  Defaulting to ." + cmd(), ""},
         {{"-h", "my home", "-c", "K=a b"}, {}, 0,  // "my home" is a link to "."
-         cmd("\"my home/logs/\" -h \"my home\" -c \"K=a b\"", "\"my home/logs/qsdinst.log\""), ""},
-        {{"-h", "none"}, {}, 248, cmd("none/logs/ -h none", "none/logs/qsdinst.log"),
-         "Error: Can't open <none/logs/qsdinst.log>\n"}};
+         cmd("\"my home/logs/\" -h \"my home\" -c \"K=a b\"", "\"my home/logs/qsdinst.log\""),
+         "Warning: -s skips the VXAENV update; -c and -m are not applied\n"},
+        // A wrong -h is named before anything starts.
+        {{"-h", "none"}, {}, 249, "", "Error: Installation directory <none/> does not exist\n"},
+        // -s leaves the VXAENV update out, so -c and -m would do nothing.
+        {{"-h", ".", "-m", "kzr"}, {}, 0, cmd("./ -h . -m kzr"),
+         "Warning: -s skips the VXAENV update; -c and -m are not applied\n"},
+        // A line break or another control byte in a setting or a module name.
+        {{"-c", "K=a\nB=b"}, {}, 254, no, "Error: Bad env var K=a\\nB=b\n"},
+        {{"-c", "K\033=b"}, {}, 254, no, "Error: Bad env var K\\x1b=b\n"},
+        {{"-m", "kzr\nKDS_START=9"}, {}, 254, no, "Error: Bad module name kzr\\nKDS_START=9\n"},
+        {{"-v", "6\r"}, {}, 254, no, "Error: Version 6\\r not supported\n"},
+        {{"-m", "a;b\t"}, {}, 254, no, "Error: Bad module name a;b\\t\n"}};
     // clang-format on
     for (const auto& c : cases) {
         SampleInstall s;
@@ -71,8 +126,11 @@ TEST(CommandLine, VersionRefusalsHomeAndTheRelaunchLine) {
         options.set_env = c.env;
         std::vector<std::string> args = c.args;
         args.insert(args.end(), {"-e", "-s", "../image"});
+        const std::string before = tree_snapshot(s.home);
         const RunResult r = tool(args, options);
         EXPECT_EQ(std::to_string(r.exit_code) + r.err, std::to_string(c.status) + c.err) << r.out;
+        // A refused command line leaves the home as it was.
+        EXPECT_TRUE(c.status != 254 || tree_snapshot(s.home) == before) << r.out;
         // All of the output, or its end after a trace line.
         EXPECT_TRUE(r.out == c.out || (r.out[0] == '(' && ends_with(r.out, c.out))) << r.out;
         EXPECT_EQ(exists(s.home + "/qsdinst.log"), c.out.find(">>./") != std::string::npos);

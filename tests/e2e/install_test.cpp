@@ -59,6 +59,7 @@ TEST(Install, EachOutcomeEndsTheRunWithItsStatus) {
     const std::string srv = "tables/SRV1/", cic = "tables/cicatrsq/", cat = cic + "qdsload.catalog";
     const std::string atr = srv + "ATTRLIB/kzr.atr";
     const auto none = [](S) {};
+    const auto no_config = [](S s) { remove_tree(s.home + "/config"); };
     // clang-format off
     const struct { void (*prepare)(S); std::vector<std::string> flags; const char* fail; int rc;
                    std::string done, not_done; } cases[] = {
@@ -68,7 +69,7 @@ TEST(Install, EachOutcomeEndsTheRunWithItsStatus) {
         {[](S s) { fs::copy(s.image + "/MSRV/SQLLIB", s.cicatrsq() + "/SQLLIB"); }, {"-s"}, "", 0,
          cat, atr},
         {none, {"-e", "-s"}, "", 0, "", atr},  // seeding would fail: no copies
-        {[](S s) { remove_tree(s.home + "/config"); }, {}, "", 2, "", atr},
+        {no_config, {}, "", 2, "", atr},
         {[](S s) { remove_tree(s.tables() + "/ATTRLIB"); }, {}, "", -5, "",
          srv + "RKDSCATL/kzr.cat"},
         {none, {}, "kzr_a.sql", -6, cic + "TECLIB/kzr_table.baroc", ""},
@@ -93,11 +94,104 @@ TEST(Install, EachOutcomeEndsTheRunWithItsStatus) {
         EXPECT_FALSE(!c.not_done.empty() && exists(s.home + "/" + c.not_done)) << c.not_done;
         std::vector<std::string> args = c.flags;
         args.insert(args.end(), {"-h", relaunched.home, relaunched.image});
-        for (int run = 0; run < 2; ++run)
-            EXPECT_EQ(tool(args, options).exit_code, c.rc & 0xFF);
+        const std::string log_file = relaunched.home + "/logs/qsdinst.log";
+        for (int run = 0; run < 2; ++run) {
+            const RunResult first = tool(args, options);
+            EXPECT_EQ(first.exit_code, c.rc & 0xFF);
+            // A failure shows its "Error:" lines, then where the whole story is.
+            const std::string closing = "zr7inst: installation failed with exit status <" +
+                                        std::to_string(c.rc & 0xFF) + ">; see <" + log_file + ">\n";
+            EXPECT_TRUE(c.rc == 0 ? first.err.empty()
+                                  : ("\n" + first.err).find("\nError: ") != std::string::npos &&
+                                        ends_with(first.err, closing))
+                << first.err;
+        }
         const std::string log = read_file(relaunched.home + "/logs/qsdinst.log");
         EXPECT_NE(log.find(line, log.find(line) + 1), std::string::npos) << log;
     }
+}
+
+// The installing run's error lines reach the first invocation's standard
+// error, with the system's reason where the line names none.
+TEST(Install, AMissingConfigurationIsReportedOnStandardError) {
+    SampleInstall s;
+    remove_tree(s.home + "/config");
+    const RunResult r = tool({"-h", s.home, s.image});
+    EXPECT_EQ(std::to_string(r.exit_code) + r.err,
+              "2Error: Can't open kmsenv\nError: <" + s.home +
+                  "/config/.ConfigData/kmsenv>: No such file or directory\n"
+                  "zr7inst: installation failed with exit status <2>; see <" +
+                  s.home + "/logs/qsdinst.log>\n");
+}
+
+// A server or architecture name from kmsenv that would lead out of its
+// directory, or break a line of the log, stops the run before any command:
+// nothing is written anywhere, in the home or outside it.
+TEST(Install, BadNamesInTheConfigurationAreRefused) {
+    const std::pair<std::string, std::string> cases[] = {
+        {"../x|BINARCH|lx8266|", "Error: Bad server name <../x>"},
+        {"..|BINARCH|lx8266|", "Error: Bad server name <..>"},
+        {"a/b|BINARCH|lx8266|", "Error: Bad server name <a/b>"},
+        {"SRV\033]0;x|BINARCH|lx8266|", "Error: Bad server name <SRV\\x1b]0;x>"},
+        {"SRV1|BINARCH|../../x|", "Error: Bad architecture <../../x>"},
+        {"SRV1|BINARCH|.|", "Error: Bad architecture <.>"},
+        {"SRV1|BINARCH|lx\x7f|", "Error: Bad architecture <lx\\x7f>"}};
+    for (const auto& [record, line] : cases) {
+        SampleInstall s;
+        write_file(s.home + "/config/.ConfigData/kmsenv",
+                   "FIELDSEP=|\n" + record + "\nSRV1|NETWORKPROTOCOL|ip.pipe|\n");
+        const auto listing = [&] {
+            std::string text;
+            for (const auto& entry : fs::recursive_directory_iterator(s.root.path()))
+                text += entry.path().string() + "\n";
+            return text;
+        };
+        const std::string before = listing();
+        const RunResult r = install(s);
+        EXPECT_EQ(std::to_string(r.exit_code) + r.err, "255" + line + "\n") << record;
+        EXPECT_TRUE(has_trace_line(r.out, line) && ends_with(r.out, "\nExiting with rc <-1>\n"))
+            << r.out;
+        EXPECT_EQ(listing(), before) << record;
+    }
+}
+
+// Names in the image with a line break or a terminal command: the log keeps
+// one line per trace line, so the run's own closing lines cannot be forged.
+TEST(Install, NamesInTheImageCannotForgeALineOfTheLog) {
+    SampleInstall s;
+    write_file(s.image + "/MSRV/ATTRLIB/x\nExiting with rc <0>\n.atr", "a\n");
+    write_file(s.image + "/MSRV/ATTRLIB/\033]0;title\007.atr", "b\n");
+    RunOptions fail;  // the run then fails, after the copies
+    fail.set_env["QDSLOAD_FAIL"] = "kzr_a.sql";
+    const RunResult r = tool({"-h", s.home, s.image}, fail);
+    EXPECT_EQ(r.exit_code, 250) << r.err;
+    const std::string log = read_file(s.home + "/logs/qsdinst.log");
+    std::vector<std::string> exiting, begins, ends;
+    std::size_t at = 0;
+    for (std::size_t end; (end = log.find('\n', at)) != std::string::npos; at = end + 1) {
+        const std::string line = log.substr(at, end - at);
+        if (line.rfind("Exiting with rc", 0) == 0)
+            exiting.push_back(line);
+        if (line.find(") zr7inst 06100400 run begins: time ") != std::string::npos)
+            begins.push_back(line);
+        if (line.find(") zr7inst run ends: rc ") != std::string::npos)
+            ends.push_back(line);
+    }
+    EXPECT_EQ(exiting, std::vector<std::string>{"Exiting with rc <-6>"}) << log;
+    EXPECT_EQ(log.find('\033'), std::string::npos);
+    EXPECT_NE(log.find("<x\\nExiting with rc <0>\\n.atr>"), std::string::npos) << log;
+    EXPECT_NE(log.find("<\\x1b]0;title\\x07.atr>"), std::string::npos) << log;
+    // The run's first and last lines: who ran what, and how it ended.
+    ASSERT_EQ(begins.size(), 1u) << log;
+    EXPECT_NE(begins[0].find(", command " + tool_path() + " -o " + s.home + "/logs/ -h "),
+              std::string::npos)
+        << begins[0];
+    ASSERT_EQ(ends.size(), 1u) << log;
+    EXPECT_TRUE(
+        std::regex_search(ends[0], std::regex(", files copied [1-9][0-9]*, files seeded [0-9]+, "
+                                              "VXAENV not updated, elapsed [0-9]+\\.[0-9]{3} s$")))
+        << ends[0];
+    EXPECT_NE(ends[0].find("rc -6,"), std::string::npos) << ends[0];
 }
 
 // The loader runs in the order the directory gives the files; the second of
@@ -184,11 +278,13 @@ TEST(Progress, OnlyOnATerminal) {
     EXPECT_TRUE(std::regex_match(
         tty, std::regex("[^\n]*\r *\rzr7inst: installation done\r\n"
                         "  files copied: [1-9][0-9]*\r\n  files seeded: 2\r\n"
-                        "  VXAENV: changed, backup [^\n]*/\\.archive/VXAENV_[0-9]+\r\n")))
+                        "  VXAENV: changed, backup [^\n]*/\\.archive/VXAENV_[0-9]+\r\n"
+                        "  log: home/logs/qsdinst\\.log\r\n  elapsed: [0-9]+\\.[0-9]{3} s\r\n")))
         << tty;
     EXPECT_EQ(r.err, "");
     const auto same = [](const std::string& text) {
-        return std::regex_replace(text, std::regex("[0-9]+|backup\\.\\w+"), "#");
+        // The header names the working directory, which differs.
+        return std::regex_replace(text, std::regex("[0-9]+|backup\\.\\w+|cwd [^,]*"), "#");
     };
     EXPECT_EQ(same(t.out), same(r.out));
     EXPECT_EQ(same(read_file(on_tty.home + "/logs/qsdinst.log")),

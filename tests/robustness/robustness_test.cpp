@@ -329,7 +329,7 @@ const ShapeCase kCases[] = {
     {"kmsenv_crlf", {"file K FIELDSEP=|\r\nSRV1|NETWORKPROTOCOL|ip.pipe|\r\nSRV1|IPPIPEPORTNUMBER|1918|\r\nSRV1|BINARCH|lx8266|\r\n"}, {}, 0, ""},
     {"kmsenv_no_final_newline", {"file K " + kConfig.substr(0, kConfig.size() - 1)}, {}, 0, ""},
     {"kmsenv_nul_in_a_heading", {"file K HEAD\0ING=x\n"s + kConfig}, {}, 0, ""},
-    {"kmsenv_nul_in_the_server_name", {"file K FIELDSEP=|\nSRV1\0x|BINARCH|lx8266|\n"s}, {}, 255, "Error: Server name or architecture in kmsenv holds a NUL byte"},
+    {"kmsenv_nul_in_the_server_name", {"file K FIELDSEP=|\nSRV1\0x|BINARCH|lx8266|\n"s}, {}, 255, "Error: Bad server name <SRV1\\x00x>"},
     {"kmsenv_nul_in_the_protocol", {"file K " + kConfig + "SRV1|NETWORKPROTOCOL|ip\0pipe|\n"s}, {}, 250, "Error: Seeding <"},
     {"kmsenv_mebibyte_heading", {"file K " + kMebibyte + "\n" + kConfig}, {}, 0, ""},
     {"kmsenv_mebibyte_record", {"file K " + kConfig + "SRV1|X|" + kMebibyte + "|\n"}, {}, 0, ""},
