@@ -73,8 +73,12 @@ int jump_start(int argc, char** argv, const char* home) {
     job.args = relaunch_arguments(argc, argv, home);
     job.stdout_path = log_file;
     job.stdout_mode = OutputMode::kAppend;
+    // An interruption meant for the installation goes to the run that can
+    // stop it cleanly; this one goes on waiting for its status.
+    job.forward_signals = true;
 
-    const int status = run_process(job);
+    const ProcessResult result = run_process_ex(job);
+    const int status = result.status;
     if (status == kRunStdoutFailed) {
         std::fprintf(stderr, "Error: Can't open <%s>\n", log_file.c_str());
         return -8;
@@ -83,6 +87,8 @@ int jump_start(int argc, char** argv, const char* home) {
         std::fprintf(stderr, "Error: Can't start <%s>\n", argv[0]);
         return kRelaunchNotStarted;
     }
+    if (result.signal != 0)
+        std::fprintf(stderr, "Error: The installing run was ended by signal <%d>\n", result.signal);
     return status;
 }
 

@@ -6,6 +6,7 @@
 #include "qsd/driver/driver.h"
 #include "qsd/driver/getopt.h"
 #include "qsd/installer/installer610.h"
+#include "qsd/platform/interruption.h"
 #include "qsd/platform/progress.h"
 #include "qsd/platform/trace.h"
 
@@ -93,7 +94,11 @@ int run_main(int argc, char** argv) {
         ZR7_RETURN(status);
     }
 
-    // The installing invocation: a progress line for a watching terminal.
+    // The installing invocation: SIGINT, SIGTERM and SIGHUP stop it between
+    // files, not inside one.
+    catch_interruptions();
+
+    // A progress line for a watching terminal.
     progress_enable(progress_wanted(::isatty(STDERR_FILENO) == 1, ::isatty(STDOUT_FILENO) == 1));
 
     if (zr7_trace.detail()) {

@@ -29,6 +29,9 @@ class Installer610 {
     int init(const std::string& src_dir, const std::string& home_dir);
     int go();
     int process_commands(CommandList& commands);
+    // The stop at a recorded signal N: "Error: Interrupted by signal <N>" in
+    // the log and on standard error; returns 128+N, the run's status.
+    int interrupted();
 
     // Server configuration.
     int read_config(const std::string& home);
