@@ -14,6 +14,7 @@
 #include <algorithm>
 #include <cerrno>
 #include <chrono>
+#include <cstring>
 #include <filesystem>
 #include <random>
 #include <set>
@@ -21,6 +22,8 @@
 
 #include "qsd/envfile/env_rewrite.h"
 #include "support/test_support.h"
+
+extern char** environ;
 
 namespace {
 using namespace std::string_literals;
@@ -46,8 +49,10 @@ struct Launch {
 
 // Starts the tool with standard output and error on `fd`, in a process group
 // of its own (kill(-pid) reaches its children). The child allocates nothing.
+// An unprivileged run starts the copies in a directory every account reaches.
 pid_t start(const SampleInstall& s, const Launch& l, int fd) {
-    std::vector<std::string> args{zr7test::tool_path(), "-o", s.home + "/logs/", "-h", s.home};
+    const std::string bin = l.as_nobody ? zr7test::reachable_bin_dir() : zr7test::bin_dir();
+    std::vector<std::string> args{bin + "/zr7inst", "-o", s.home + "/logs/", "-h", s.home};
     args.erase(args.begin() + 1, args.begin() + (l.relaunch ? 3 : 1));
     args.insert(args.end(), l.options.begin(), l.options.end());
     args.push_back(s.image);
@@ -56,8 +61,13 @@ pid_t start(const SampleInstall& s, const Launch& l, int fd) {
     for (const char* name : {"MARLIN_HOME", "MARLINHOME", "QDSLOAD_FAIL", "QDSLOAD_RECORD"})
         ::unsetenv(name);
     (void)(l.relaunch ? ::unsetenv("VXA_TRC1") : ::setenv("VXA_TRC1", "ERROR (UNIT:zr7 ALL)", 1));
-    if (std::string(std::getenv("PATH")).rfind(zr7test::bin_dir() + ":", 0) != 0)
-        ::setenv("PATH", (zr7test::bin_dir() + ":" + std::getenv("PATH")).c_str(), 1);
+    std::vector<std::string> env{"PATH=" + bin + ":" + std::getenv("PATH")};
+    for (char** entry = environ; *entry != nullptr; ++entry) {
+        if (std::strncmp(*entry, "PATH=", 5) != 0)
+            env.push_back(*entry);
+    }
+    std::vector<char*> envp(env.size() + 1, nullptr);
+    std::transform(env.begin(), env.end(), envp.begin(), [](auto& e) { return e.data(); });
     struct rlimit limit {};
     limit.rlim_cur = limit.rlim_max = static_cast<rlim_t>(l.limit);
     const pid_t pid = ::fork();
@@ -69,7 +79,7 @@ pid_t start(const SampleInstall& s, const Launch& l, int fd) {
             ::dup2(fd, 2) == 2 && (l.limit < 0 || ::setrlimit(RLIMIT_FSIZE, &limit) == 0) &&
             (!l.as_nobody ||
              (::setgroups(0, nullptr) == 0 && ::setgid(65534) == 0 && ::setuid(65534) == 0)))
-            ::execv(argv[0], argv.data());
+            ::execve(argv[0], argv.data(), envp.data());
         ::_exit(127);
     }
     ::setpgid(pid, pid);  // here too, so that a kill right after the start finds the group
@@ -352,7 +362,7 @@ TEST_P(Shapes, EndWithTheirStatusAndLineAndVxaenvWholeAndRight) {
     const ShapeCase& c = GetParam();
     if (c.as_nobody && ::geteuid() != 0)
         GTEST_SKIP() << "only root can run as an unprivileged user";
-    SampleInstall s;
+    SampleInstall s(c.as_nobody ? zr7test::reachable_dir() : "");
     shape(s, c.steps);
     if (c.as_nobody)  // the whole tree, so that the unprivileged run can work in it
         zr7test::run("/bin/chown", {"-R", "65534:65534", s.root.path()});
