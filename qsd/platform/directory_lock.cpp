@@ -21,9 +21,16 @@ namespace zr7 {
 
 namespace {
 
-// Directories this process holds, by device and inode, with a use count.
+// Directories this process holds, by device and inode, with a use count. A
+// forked child is another process: it starts with none, and takes the lock
+// on a descriptor of its own like any other process.
 std::map<std::pair<unsigned long long, unsigned long long>, int>& held() {
     static std::map<std::pair<unsigned long long, unsigned long long>, int> locks;
+    static pid_t owner = ::getpid();
+    if (owner != ::getpid()) {
+        locks.clear();
+        owner = ::getpid();
+    }
     return locks;
 }
 
