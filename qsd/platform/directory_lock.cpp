@@ -189,9 +189,8 @@ void DirectoryLock::take(const std::string& dir, int lock_fd) {
                 ZR7_ERROR("%s", gave_up.c_str());
                 return;
             }
-            std::this_thread::sleep_for(
-                std::min<std::chrono::steady_clock::duration>(std::chrono::milliseconds(100),
-                                                              deadline - now));
+            std::this_thread::sleep_for(std::min<std::chrono::steady_clock::duration>(
+                std::chrono::milliseconds(100), deadline - now));
             if (try_lock(lock_fd))
                 break;
             if (errno != EWOULDBLOCK) {

@@ -153,8 +153,7 @@ ProcessResult run_process_ex(const ProcessSpec& job) {
     FdGuard in_guard(in_by_path ? ::open(job.stdin_path.c_str(), O_RDONLY | O_CLOEXEC) : -1);
     const int in_fd = job.stdin_fd >= 0 ? job.stdin_fd : in_guard.get();
     struct stat in_st {};
-    if (in_by_path &&
-        (in_fd < 0 || ::fstat(in_fd, &in_st) != 0 || S_ISDIR(in_st.st_mode))) {
+    if (in_by_path && (in_fd < 0 || ::fstat(in_fd, &in_st) != 0 || S_ISDIR(in_st.st_mode))) {
         return failed(kRunStdinFailed);
     }
     if (job.stdin_fd >= 0 && ::fstat(in_fd, &in_st) != 0)

@@ -55,9 +55,9 @@ TEST(DirectoryLockTest, MissingDirectoryIsNotLocked) {
 
 TEST(DirectoryLockTest, WaitSettingIsWholeSecondsUpToADay) {
     const std::tuple<const char*, int> cases[] = {
-        {nullptr, 600}, {"", 600},    {"0", 0},      {"1", 1},       {"86400", 86400},
-        {"86401", 600}, {"-1", 600},  {"1.5", 600},  {" 5", 600},    {"5s", 600},
-        {"0007", 7},    {"99999999999999999999", 600}};
+        {nullptr, 600},   {"", 600},      {"0", 0},    {"1", 1},
+        {"86400", 86400}, {"86401", 600}, {"-1", 600}, {"1.5", 600},
+        {" 5", 600},      {"5s", 600},    {"0007", 7}, {"99999999999999999999", 600}};
     for (const auto& [setting, seconds] : cases)
         EXPECT_EQ(zr7::lock_wait_seconds(setting), seconds) << (setting ? setting : "(unset)");
 }
@@ -77,10 +77,14 @@ TEST(DirectoryLockTest, RootLockDirectoryOnlyWhenNobodyElseCanWriteIt) {
     const std::string elsewhere = dir / "real";
     // A step: "mode", "owner", "file", "link"; then whether the directory is taken.
     const std::tuple<const char*, const char*, unsigned, bool> cases[] = {
-        {"missing", "", 0, true},          {"private", "mode", 0700, true},
-        {"readable", "mode", 0755, true},  {"group_writable", "mode", 0770, false},
-        {"world_writable", "mode", 01777, false}, {"other_owner", "owner", 0700, false},
-        {"a_file", "file", 0600, false},   {"a_link", "link", 0700, false}};
+        {"missing", "", 0, true},
+        {"private", "mode", 0700, true},
+        {"readable", "mode", 0755, true},
+        {"group_writable", "mode", 0770, false},
+        {"world_writable", "mode", 01777, false},
+        {"other_owner", "owner", 0700, false},
+        {"a_file", "file", 0600, false},
+        {"a_link", "link", 0700, false}};
     for (const auto& [name, step, mode, taken] : cases) {
         const std::string path = dir / name;
         if (std::string(step) == "mode" || std::string(step) == "owner") {
@@ -141,8 +145,8 @@ TEST(DirectoryLockTest, AsRootAnUnprivilegedFlockOnTheDirectoryStallsNothing) {
         EXPECT_TRUE(lock.locked());
         struct stat st {};
         ASSERT_EQ(::stat(dir.path().c_str(), &st), 0);
-        const std::string file = zr7::root_lock_directory() + "/" +
-                                 zr7::lock_file_name(st.st_dev, st.st_ino);
+        const std::string file =
+            zr7::root_lock_directory() + "/" + zr7::lock_file_name(st.st_dev, st.st_ino);
         EXPECT_EQ(zr7test::read_file(file), std::to_string(::getpid()) + "\n");
         struct stat file_st {};
         ASSERT_EQ(::lstat(file.c_str(), &file_st), 0);
@@ -178,7 +182,8 @@ TEST(DirectoryLockTest, AWaitIsAnnouncedAndGivenUp) {
     int status = 0;
     ASSERT_EQ(::waitpid(pid, &status, 0), pid);
     EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 0);
-    const std::string holder = ::geteuid() == 0 ? " (pid <" + std::to_string(::getpid()) + ">)" : "";
+    const std::string holder =
+        ::geteuid() == 0 ? " (pid <" + std::to_string(::getpid()) + ">)" : "";
     EXPECT_EQ(err, "Waiting for another installation in <" + dir.path() + ">" + holder +
                        "\nError: Another installation holds <" + dir.path() + ">" + holder +
                        "; gave up after <1> s\n");

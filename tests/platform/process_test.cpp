@@ -40,7 +40,8 @@ TEST(ProcessChild, DefaultSignalActionsAndAnEmptyMask) {
     zr7test::TempDir dir;
     struct sigaction ignore {};
     ignore.sa_handler = SIG_IGN;
-    struct sigaction old_int {}, old_pipe {};
+    struct sigaction old_int {
+    }, old_pipe{};
     ASSERT_EQ(::sigaction(SIGINT, &ignore, &old_int), 0);
     ASSERT_EQ(::sigaction(SIGPIPE, &ignore, &old_pipe), 0);
     sigset_t block, old_mask;
@@ -48,8 +49,8 @@ TEST(ProcessChild, DefaultSignalActionsAndAnEmptyMask) {
     sigaddset(&block, SIGTERM);
     sigaddset(&block, SIGHUP);
     ASSERT_EQ(::sigprocmask(SIG_BLOCK, &block, &old_mask), 0);
-    const int result = zr7::run_process(
-        {"cat", {"/proc/self/status"}, "", dir / "status", OutputMode::kTruncate});
+    const int result =
+        zr7::run_process({"cat", {"/proc/self/status"}, "", dir / "status", OutputMode::kTruncate});
     ::sigprocmask(SIG_SETMASK, &old_mask, nullptr);
     ::sigaction(SIGINT, &old_int, nullptr);
     ::sigaction(SIGPIPE, &old_pipe, nullptr);
@@ -124,7 +125,7 @@ TEST(ProcessChild, SignalsPassedOnWhileWaiting) {
 // The installing run's handlers only record: the process goes on, and the
 // first signal is the one reported.
 TEST(Interruption, RecordedNotFatal) {
-    struct sigaction saved[3] {};
+    struct sigaction saved[3]{};
     const int signals[] = {SIGINT, SIGTERM, SIGHUP};
     for (int i = 0; i < 3; ++i)
         ::sigaction(signals[i], nullptr, &saved[i]);

@@ -544,7 +544,9 @@ TEST_P(Signals, StopBetweenFilesWithTheirStatusAndLine) {
 }
 
 INSTANTIATE_TEST_SUITE_P(All, Signals, ::testing::ValuesIn(kSignalCases),
-                         [](const ::testing::TestParamInfo<SignalCase>& c) { return c.param.name; });
+                         [](const ::testing::TestParamInfo<SignalCase>& c) {
+                             return c.param.name;
+                         });
 
 // The environment of the runs a test starts, for the test's length.
 class ScopedEnv {

@@ -155,7 +155,8 @@ RunResult run(const std::string& program, const std::vector<std::string>& args,
             read_file(capture / "out"), options.stderr_path.empty() ? read_file(err) : ""};
 }
 
-SampleInstall::SampleInstall(const std::string& parent) : root(parent) {  // paths ending in "/" are directories
+SampleInstall::SampleInstall(const std::string& parent)
+    : root(parent) {  // paths ending in "/" are directories
     const std::string t = tables() + "/", c = cicatrsq() + "/", ms = home + "/lx8266/ms/";
     const std::string m = image + "/MSRV/", a = m + "lx8266/";
     // clang-format off
