@@ -97,6 +97,7 @@ int run_main(int argc, char** argv) {
     // The installing invocation: SIGINT, SIGTERM and SIGHUP stop it between
     // files, not inside one.
     catch_interruptions();
+    ignore_file_size_signal();
 
     // A progress line for a watching terminal.
     progress_enable(progress_wanted(::isatty(STDERR_FILENO) == 1, ::isatty(STDOUT_FILENO) == 1));

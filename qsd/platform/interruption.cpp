@@ -45,6 +45,10 @@ void catch_interruptions() {
         ::sigaction(signal_number, &action, nullptr);
 }
 
+void ignore_file_size_signal() {
+    ::signal(SIGXFSZ, SIG_IGN);
+}
+
 int interruption() {
     return static_cast<int>(g_signal);
 }

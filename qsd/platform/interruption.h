@@ -20,6 +20,12 @@ constexpr int kStatusInterrupted = -11;
 // installing run, once, at its start). Interrupted system calls restart.
 void catch_interruptions();
 
+// Ignores SIGXFSZ (the installing run, at its start): a write beyond the
+// file size limit then fails like a write to a full disk, which the run
+// reports, instead of ending the run without a word. The programs the run
+// starts get the default action back.
+void ignore_file_size_signal();
+
 // 0, or the number of the first of those signals that arrived since
 // catch_interruptions. Cheap: call it wherever a run may stop.
 int interruption();
