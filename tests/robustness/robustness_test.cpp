@@ -616,6 +616,28 @@ TEST(Locks, AHeldServerIsWaitedForThenGivenUp) {
     EXPECT_FALSE(zr7test::exists(s.tables() + "/ATTRLIB/kzr.atr"));  // nothing copied
 }
 
+// A signal ends the wait at once, as it would end the run.
+TEST(Locks, ASignalEndsTheWait) {
+    SampleInstall s;
+    const pid_t holder = hold_lock(s.home + "/", false);
+    ASSERT_GT(holder, 0);
+    ScopedEnv wait("ZR7_LOCK_WAIT", "60");
+    const std::string out = s.root / "out";
+    const int fd = ::open(out.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, 0644);
+    const pid_t run = start(s, {change_options(1)}, fd);
+    ::close(fd);
+    EXPECT_TRUE(
+        poll_until([&] { return read_file(out).find("Waiting for") != std::string::npos; }));
+    const auto signalled = std::chrono::steady_clock::now();
+    ::kill(run, SIGTERM);
+    EXPECT_EQ(wait_for(run), 143) << read_file(out);
+    EXPECT_LT(std::chrono::steady_clock::now() - signalled, std::chrono::seconds(10));
+    ::kill(holder, SIGKILL);
+    wait_for(holder);
+    EXPECT_NE(read_file(out).find("Error: Interrupted by signal <15>\n"), std::string::npos);
+    EXPECT_EQ(read_file(s.vxaenv), zr7test::kSampleVxaenv);
+}
+
 // As root, an account that can merely open the installation directory cannot
 // stall an installation by locking it.
 TEST(Locks, AsRootAnUnprivilegedFlockStallsNothing) {
