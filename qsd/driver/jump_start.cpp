@@ -98,12 +98,18 @@ int jump_start(int argc, char** argv, const char* home) {
     job.args = relaunch_arguments(argc, argv, home);
     job.stdout_path = log_file;
     job.stdout_fd = log_fd.get();
+    // An interruption meant for the installation goes to the run that can
+    // stop it cleanly; this one goes on waiting for its status.
+    job.forward_signals = true;
 
-    const int status = run_process(job);
+    const ProcessResult result = run_process_ex(job);
+    const int status = result.status;
     if (status < 0) {
         std::fprintf(stderr, "Error: Can't start <%s>\n", escape_controls(argv[0]).c_str());
         return kRelaunchNotStarted;
     }
+    if (result.signal != 0)
+        std::fprintf(stderr, "Error: The installing run was ended by signal <%d>\n", result.signal);
     // The installing run's own lines are in the log; a script that sees only
     // the status learns where to look.
     if (status != 0)

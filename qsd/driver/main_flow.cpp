@@ -10,6 +10,7 @@
 #include "qsd/driver/driver.h"
 #include "qsd/driver/getopt.h"
 #include "qsd/installer/installer610.h"
+#include "qsd/platform/interruption.h"
 #include "qsd/platform/progress.h"
 #include "qsd/platform/trace.h"
 #include "qsd/text/escape.h"
@@ -150,8 +151,11 @@ int run_main(int argc, char** argv) {
     }
 
     // The installing invocation: its errors also reach the first
-    // invocation's standard error, and a watching terminal gets progress.
+    // invocation's standard error; SIGINT, SIGTERM and SIGHUP stop it between
+    // files, not inside one; a watching terminal gets progress.
     trace_echo_errors(true);
+    catch_interruptions();
+    ignore_file_size_signal();
     progress_enable(progress_wanted(::isatty(STDERR_FILENO) == 1, ::isatty(STDOUT_FILENO) == 1));
     const std::string log_file = installer.log_dir + "qsdinst.log";
 

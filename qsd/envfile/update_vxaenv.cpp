@@ -80,6 +80,8 @@ int Installer610::update_vxaenv(const std::string& dir_template) {
     // Held until the new file is in place: a run that waits here reads the
     // file that the run before it wrote.
     zr7::DirectoryLock lock(dir);
+    if (lock.failure() != 0)  // a wait given up or a refused lock: reported already
+        ZR7_RETURN(lock.failure());
     if (!lock.locked()) {
         ZR7_ERROR("Error: Can't open <%s>", env_path.c_str());
         ZR7_RETURN(-7);

@@ -5,6 +5,7 @@
 #include "qsd/fileops/tree_walk.h"
 #include "qsd/installer/installer610.h"
 #include "qsd/platform/fs.h"
+#include "qsd/platform/interruption.h"
 #include "qsd/platform/progress.h"
 #include "qsd/platform/trace.h"
 
@@ -37,6 +38,9 @@ int Installer610::copy(const std::string& src_template, const std::string& dst_t
     // Only the files directly in the source; the destination must exist.
     zr7::fs::UniqueFd dst_dir;
     for (const std::string& name : names) {
+        // A signal to stop is taken between files, never inside a copy.
+        if (zr7::interruption() != 0)
+            ZR7_RETURN(zr7::kStatusInterrupted);
         const std::string from = src + "/" + name;
         const std::string to = dst + "/" + name;
         zr7::ImageEntry entry;
@@ -112,5 +116,5 @@ int Installer610::recursive_copy(const std::string& src_template, const std::str
     const zr7::ServerDirGuard guard = server_dir_guard();
     const int status = zr7::copy_tree(image, top, src, dst_dir.get(), dst + "/",
                                       zr7::copy_flags_from_options(options), guard);
-    ZR7_RETURN(status == 0 || status == -9 ? status : -5);
+    ZR7_RETURN(status == 0 || status == -9 || status == zr7::kStatusInterrupted ? status : -5);
 }

@@ -11,6 +11,7 @@
 #include "qsd/fileops/copy_at.h"
 #include "qsd/fileops/install_util.h"
 #include "qsd/platform/fs.h"
+#include "qsd/platform/interruption.h"
 #include "qsd/platform/progress.h"
 #include "qsd/platform/trace.h"
 
@@ -68,6 +69,9 @@ int walk(Walk& w, const ImageEntry& src, const std::string& src_shown, int dst_d
     if (!w.check_only)
         fs::remove_stale_scratch(dst_dir, "zr7copy");
     for (const std::string& name : names) {
+        // A signal to stop is taken between files, never inside a copy.
+        if (!w.check_only && interruption() != 0)
+            ZR7_RETURN(kStatusInterrupted);
         const std::string src_path = src_shown + "/" + name;
         const std::string dst_path = dst_shown + name;
         ImageEntry entry;

@@ -1,7 +1,10 @@
+#include <cstdio>
 #include "qsd/config/names.h"
+
 #include "qsd/fileops/install_util.h"
 #include "qsd/installer/installer610.h"
 #include "qsd/platform/directory_lock.h"
+#include "qsd/platform/interruption.h"
 #include "qsd/platform/progress.h"
 #include "qsd/platform/trace.h"
 
@@ -41,20 +44,16 @@ int Installer610::init(const std::string& src_dir, const std::string& home_dir) 
     ZR7_RETURN(status);
 }
 
-namespace {
-
-void report_wait(const std::string& home) {
-    ZR7_TRACED("Installer610::go");
-    ZR7_DETAIL("Waiting for another installation in <%s>", home.c_str());
-}
-
-}  // namespace
-
 int Installer610::go() {
     ZR7_OPERATION("Installer610::go");
     // Two installations into one server take turns: their copies would race
     // for the same files, and each must see the other's VXAENV.
-    zr7::DirectoryLock run_lock(home_path, report_wait);
+    // The lock reports its own wait and why it gave up.
+    zr7::DirectoryLock run_lock(home_path);
+    if (run_lock.failure() == zr7::kStatusInterrupted)
+        ZR7_RETURN(interrupted());
+    if (run_lock.failure() != 0)
+        ZR7_RETURN(run_lock.failure());
     if (copying == 0)
         ZR7_DETAIL("Copying disabled");
     if (seeding == 0)
@@ -72,6 +71,9 @@ int Installer610::process_commands(CommandList& commands) {
     ZR7_OPERATION("Installer610::process_commands");
     int status = 0;
     for (std::size_t i = 0; i < commands.size(); ++i) {
+        // Between commands is a safe point: every file so far is whole.
+        if (zr7::interruption() != 0)
+            ZR7_RETURN(interrupted());
         const SimpleCommand& command = commands[i];
         zr7::progress_command(static_cast<int>(i + 1), static_cast<int>(commands.size()),
                               command.kind, command.source);
@@ -91,8 +93,21 @@ int Installer610::process_commands(CommandList& commands) {
             default:
                 break;
         }
+        // A signal that came during the command wins over the failure it
+        // may have caused (the copy program it killed).
+        if (zr7::interruption() != 0 || status == zr7::kStatusInterrupted)
+            ZR7_RETURN(interrupted());
         if (status < 0)
             ZR7_RETURN(status);
     }
     ZR7_RETURN(0);
+}
+
+int Installer610::interrupted() {
+    ZR7_TRACED("Installer610::interrupted");
+    const int signal_number = zr7::interruption();
+    ZR7_ERROR("Error: Interrupted by signal <%d>", signal_number);
+    std::fflush(stdout);
+    std::fprintf(stderr, "Error: Interrupted by signal <%d>\n", signal_number);
+    return zr7::interrupted_status(signal_number);
 }

@@ -42,6 +42,9 @@ class Installer610 {
     int check_tree_copy(const SimpleCommand& command, zr7::StringList& made);
     int check_env_file(const SimpleCommand& command);
     int check_seed(const SimpleCommand& command);
+    // The stop at a recorded signal N: "Error: Interrupted by signal <N>" in
+    // the log and on standard error; returns 128+N, the run's status.
+    int interrupted();
 
     // Server configuration.
     int read_config(const std::string& home);

@@ -2,6 +2,7 @@
 // directory lists them, through the loader.
 #include "qsd/fileops/install_util.h"
 #include "qsd/installer/installer610.h"
+#include "qsd/platform/interruption.h"
 #include "qsd/platform/trace.h"
 
 int Installer610::seed(const std::string& src_template, const std::string& dst_template) {
@@ -20,6 +21,10 @@ int Installer610::seed(const std::string& src_template, const std::string& dst_t
         ZR7_ERROR("Error: Can't open <%s>", src.c_str());
     if (status == 0) {
         for (const std::string& name : names) {
+            if (zr7::interruption() != 0) {
+                status = zr7::kStatusInterrupted;
+                break;
+            }
             status = seed_single_file(dst, name);
             if (status < 0) {
                 ZR7_ERROR("Error: Seeding <%s> failed", name.c_str());

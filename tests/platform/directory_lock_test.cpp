@@ -1,24 +1,35 @@
-// The directory lock: other processes wait, this process never waits for itself.
+// The directory lock: other processes wait a bounded time, this process never
+// waits for itself, and root's lock lives where only root can open it.
 #include "qsd/platform/directory_lock.h"
 
 #include <fcntl.h>
 #include <gtest/gtest.h>
 #include <sys/file.h>
+#include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <cstdlib>
 #include <optional>
+#include <tuple>
 
 #include "support/test_support.h"
 
 namespace {
 
+// Whether another process gets the lock at once (a wait of 0 seconds).
 bool free_for_another_process(const std::string& dir) {
+    std::fflush(nullptr);
     const pid_t pid = ::fork();
-    if (pid == 0)
-        ::_exit(::flock(::open(dir.c_str(), O_RDONLY), LOCK_EX | LOCK_NB) == 0 ? 0 : 1);
+    if (pid == 0) {
+        ::setenv("ZR7_LOCK_WAIT", "0", 1);
+        const zr7::DirectoryLock lock(dir);
+        ::_exit(lock.locked() ? 0 : lock.failure() == zr7::kStatusLockTimeout ? 1 : 2);
+    }
     int status = 0;
-    return ::waitpid(pid, &status, 0) == pid && WIFEXITED(status) && WEXITSTATUS(status) == 0;
+    EXPECT_EQ(::waitpid(pid, &status, 0), pid);
+    EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) <= 1) << status;
+    return WIFEXITED(status) && WEXITSTATUS(status) == 0;
 }
 
 TEST(DirectoryLockTest, HeldAgainstOtherProcessesAndReentrantWithinOne) {
@@ -39,6 +50,143 @@ TEST(DirectoryLockTest, MissingDirectoryIsNotLocked) {
     zr7::DirectoryLock lock(dir / "missing");
     EXPECT_FALSE(lock.locked());
     EXPECT_NE(lock.error(), 0);
+    EXPECT_EQ(lock.failure(), 0);  // the caller says what it could not open
+}
+
+TEST(DirectoryLockTest, WaitSettingIsWholeSecondsUpToADay) {
+    const std::tuple<const char*, int> cases[] = {
+        {nullptr, 600},   {"", 600},      {"0", 0},    {"1", 1},
+        {"86400", 86400}, {"86401", 600}, {"-1", 600}, {"1.5", 600},
+        {" 5", 600},      {"5s", 600},    {"0007", 7}, {"99999999999999999999", 600}};
+    for (const auto& [setting, seconds] : cases)
+        EXPECT_EQ(zr7::lock_wait_seconds(setting), seconds) << (setting ? setting : "(unset)");
+}
+
+TEST(DirectoryLockTest, LockFileNamedAfterTheDirectorysIdentity) {
+    EXPECT_EQ(zr7::lock_file_name(2049, 131073), "2049-131073.lock");
+    EXPECT_EQ(zr7::root_lock_directory(), "/run/zr7inst");  // this machine has /run
+}
+
+// Root's lock directory: made private when missing, refused in any shape that
+// another account could use to reach or replace the lock files.
+TEST(DirectoryLockTest, RootLockDirectoryOnlyWhenNobodyElseCanWriteIt) {
+    if (::geteuid() != 0)
+        GTEST_SKIP() << "only root can make directories owned by another user";
+    zr7test::TempDir dir;
+    zr7test::make_dirs(dir / "real");
+    const std::string elsewhere = dir / "real";
+    // A step: "mode", "owner", "file", "link"; then whether the directory is taken.
+    const std::tuple<const char*, const char*, unsigned, bool> cases[] = {
+        {"missing", "", 0, true},
+        {"private", "mode", 0700, true},
+        {"readable", "mode", 0755, true},
+        {"group_writable", "mode", 0770, false},
+        {"world_writable", "mode", 01777, false},
+        {"other_owner", "owner", 0700, false},
+        {"a_file", "file", 0600, false},
+        {"a_link", "link", 0700, false}};
+    for (const auto& [name, step, mode, taken] : cases) {
+        const std::string path = dir / name;
+        if (std::string(step) == "mode" || std::string(step) == "owner") {
+            ::mkdir(path.c_str(), 0700);
+            ::chmod(path.c_str(), mode);
+            if (std::string(step) == "owner") {
+                EXPECT_EQ(::chown(path.c_str(), 65534, 65534), 0);
+            }
+        }
+        if (std::string(step) == "file")
+            zr7test::write_file(path, "", mode);
+        if (std::string(step) == "link") {
+            EXPECT_EQ(::symlink(elsewhere.c_str(), path.c_str()), 0);
+        }
+        const int fd = zr7::open_lock_directory(path);
+        EXPECT_EQ(fd >= 0, taken) << name;
+        struct stat st {};
+        if (fd >= 0) {
+            EXPECT_EQ(::fstat(fd, &st), 0);
+            EXPECT_EQ(st.st_mode & 077 & ~0055u, 0u) << name;
+            ::close(fd);
+        }
+    }
+    struct stat made {};
+    ASSERT_EQ(::stat((dir / "missing").c_str(), &made), 0);
+    EXPECT_EQ(made.st_mode & 07777, 0700u);
+}
+
+// As root the lock is a file in root's lock directory holding the holder's
+// pid; a flock that another account takes on the directory stalls nothing.
+TEST(DirectoryLockTest, AsRootAnUnprivilegedFlockOnTheDirectoryStallsNothing) {
+    if (::geteuid() != 0)
+        GTEST_SKIP() << "the root rule";
+    zr7test::TempDir dir(zr7test::reachable_dir());
+    ::chmod(dir.path().c_str(), 0755);
+    int ready[2];
+    ASSERT_EQ(::pipe(ready), 0);
+    std::fflush(nullptr);
+    const pid_t squatter = ::fork();
+    if (squatter == 0) {
+        const int fd = ::setgid(65534) == 0 && ::setuid(65534) == 0
+                           ? ::open(dir.path().c_str(), O_RDONLY | O_DIRECTORY)
+                           : -1;
+        const char got = fd >= 0 && ::flock(fd, LOCK_EX | LOCK_NB) == 0 ? 'y' : 'n';
+        (void)!::write(ready[1], &got, 1);
+        ::pause();
+        ::_exit(0);
+    }
+    ::close(ready[1]);
+    char got = 0;
+    ASSERT_EQ(::read(ready[0], &got, 1), 1);
+    ::close(ready[0]);
+    EXPECT_EQ(got, 'y');  // the other account holds a flock on the directory
+    {
+        ::setenv("ZR7_LOCK_WAIT", "0", 1);
+        zr7::DirectoryLock lock(dir.path());
+        ::unsetenv("ZR7_LOCK_WAIT");
+        EXPECT_TRUE(lock.locked());
+        struct stat st {};
+        ASSERT_EQ(::stat(dir.path().c_str(), &st), 0);
+        const std::string file =
+            zr7::root_lock_directory() + "/" + zr7::lock_file_name(st.st_dev, st.st_ino);
+        EXPECT_EQ(zr7test::read_file(file), std::to_string(::getpid()) + "\n");
+        struct stat file_st {};
+        ASSERT_EQ(::lstat(file.c_str(), &file_st), 0);
+        EXPECT_TRUE(S_ISREG(file_st.st_mode));
+        EXPECT_EQ(file_st.st_mode & 07777, 0600u);
+        EXPECT_EQ(file_st.st_uid, 0u);
+    }
+    ::kill(squatter, SIGKILL);
+    ::waitpid(squatter, nullptr, 0);
+}
+
+// A wait says so, with the holder's pid where it is known, and ends.
+TEST(DirectoryLockTest, AWaitIsAnnouncedAndGivenUp) {
+    zr7test::TempDir dir;
+    zr7::DirectoryLock held(dir.path());
+    ASSERT_TRUE(held.locked());
+    int err_pipe[2];
+    ASSERT_EQ(::pipe(err_pipe), 0);
+    std::fflush(nullptr);
+    const pid_t pid = ::fork();
+    if (pid == 0) {
+        ::dup2(err_pipe[1], 2);
+        ::setenv("ZR7_LOCK_WAIT", "1", 1);
+        const zr7::DirectoryLock lock(dir.path());
+        ::_exit(lock.failure() == zr7::kStatusLockTimeout && !lock.locked() ? 0 : 1);
+    }
+    ::close(err_pipe[1]);
+    std::string err;
+    char buffer[512];
+    for (ssize_t n; (n = ::read(err_pipe[0], buffer, sizeof buffer)) > 0;)
+        err.append(buffer, static_cast<std::size_t>(n));
+    ::close(err_pipe[0]);
+    int status = 0;
+    ASSERT_EQ(::waitpid(pid, &status, 0), pid);
+    EXPECT_TRUE(WIFEXITED(status) && WEXITSTATUS(status) == 0);
+    const std::string holder =
+        ::geteuid() == 0 ? " (pid <" + std::to_string(::getpid()) + ">)" : "";
+    EXPECT_EQ(err, "Waiting for another installation in <" + dir.path() + ">" + holder +
+                       "\nError: Another installation holds <" + dir.path() + ">" + holder +
+                       "; gave up after <1> s\n");
 }
 
 }  // namespace

@@ -6,6 +6,7 @@
 #include <grp.h>
 #include <gtest/gtest.h>
 #include <signal.h>
+#include <sys/file.h>
 #include <sys/resource.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
@@ -14,13 +15,17 @@
 #include <algorithm>
 #include <cerrno>
 #include <chrono>
+#include <cstring>
 #include <filesystem>
 #include <random>
 #include <set>
 #include <thread>
 
 #include "qsd/envfile/env_rewrite.h"
+#include "qsd/platform/directory_lock.h"
 #include "support/test_support.h"
+
+extern char** environ;
 
 namespace {
 using namespace std::string_literals;
@@ -46,8 +51,10 @@ struct Launch {
 
 // Starts the tool with standard output and error on `fd`, in a process group
 // of its own (kill(-pid) reaches its children). The child allocates nothing.
+// An unprivileged run starts the copies in a directory every account reaches.
 pid_t start(const SampleInstall& s, const Launch& l, int fd) {
-    std::vector<std::string> args{zr7test::tool_path(), "-o", s.home + "/logs/", "-h", s.home};
+    const std::string bin = l.as_nobody ? zr7test::reachable_bin_dir() : zr7test::bin_dir();
+    std::vector<std::string> args{bin + "/zr7inst", "-o", s.home + "/logs/", "-h", s.home};
     args.erase(args.begin() + 1, args.begin() + (l.relaunch ? 3 : 1));
     args.insert(args.end(), l.options.begin(), l.options.end());
     args.push_back(s.image);
@@ -56,8 +63,13 @@ pid_t start(const SampleInstall& s, const Launch& l, int fd) {
     for (const char* name : {"MARLIN_HOME", "MARLINHOME", "QDSLOAD_FAIL", "QDSLOAD_RECORD"})
         ::unsetenv(name);
     (void)(l.relaunch ? ::unsetenv("VXA_TRC1") : ::setenv("VXA_TRC1", "ERROR (UNIT:zr7 ALL)", 1));
-    if (std::string(std::getenv("PATH")).rfind(zr7test::bin_dir() + ":", 0) != 0)
-        ::setenv("PATH", (zr7test::bin_dir() + ":" + std::getenv("PATH")).c_str(), 1);
+    std::vector<std::string> env{"PATH=" + bin + ":" + std::getenv("PATH")};
+    for (char** entry = environ; *entry != nullptr; ++entry) {
+        if (std::strncmp(*entry, "PATH=", 5) != 0)
+            env.push_back(*entry);
+    }
+    std::vector<char*> envp(env.size() + 1, nullptr);
+    std::transform(env.begin(), env.end(), envp.begin(), [](auto& e) { return e.data(); });
     struct rlimit limit {};
     limit.rlim_cur = limit.rlim_max = static_cast<rlim_t>(l.limit);
     const pid_t pid = ::fork();
@@ -70,7 +82,7 @@ pid_t start(const SampleInstall& s, const Launch& l, int fd) {
             ::dup2(fd, 2) == 2 && (l.limit < 0 || ::setrlimit(RLIMIT_FSIZE, &limit) == 0) &&
             (!l.as_nobody ||
              (::setgroups(0, nullptr) == 0 && ::setgid(65534) == 0 && ::setuid(65534) == 0)))
-            ::execv(argv[0], argv.data());
+            ::execve(argv[0], argv.data(), envp.data());
         ::_exit(127);
     }
     ::setpgid(pid, pid);  // here too, so that a kill right after the start finds the group
@@ -395,7 +407,7 @@ TEST_P(Shapes, EndWithTheirStatusAndLineAndVxaenvWholeAndRight) {
     const ShapeCase& c = GetParam();
     if (c.as_nobody && ::geteuid() != 0)
         GTEST_SKIP() << "only root can run as an unprivileged user";
-    SampleInstall s;
+    SampleInstall s(c.as_nobody ? zr7test::reachable_dir() : "");
     shape(s, c.steps);
     if (c.as_nobody)  // the whole tree, so that the unprivileged run can work in it
         zr7test::run("/bin/chown", {"-R", "65534:65534", s.root.path()});
@@ -532,6 +544,202 @@ TEST(Concurrency, EightRunsAtOnceAllKeepTheirChange) {
     EXPECT_EQ(backed_up.count(zr7test::kSampleVxaenv), 1u);
     for (int n = 0; n < 8; ++n)
         EXPECT_EQ(changed_by(final_content, n), final_content) << "run " << n << " lost";
+}
+
+// The pid of the installing run: the first trace line in its log names it.
+pid_t installing_pid(const SampleInstall& s) {
+    const std::string log = read_file(s.home + "/logs/qsdinst.log");
+    const std::size_t at = log.find(" pid ");
+    return at == std::string::npos ? 0 : static_cast<pid_t>(std::atol(log.c_str() + at + 5));
+}
+// Waits up to ten seconds for `ready`.
+template <typename Ready>
+bool poll_until(Ready ready) {
+    const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(10);
+    while (!ready() && std::chrono::steady_clock::now() < end)
+        std::this_thread::sleep_for(std::chrono::milliseconds(2));
+    return ready();
+}
+// Every scratch file of a copy under `dir`.
+std::vector<std::string> copy_scratch(const std::string& dir) {
+    std::vector<std::string> found;
+    for (const fs::directory_entry& e : fs::recursive_directory_iterator(dir)) {
+        if (e.path().filename().string().find(".zr7copy") != std::string::npos)
+            found.push_back(e.path());
+    }
+    return found;
+}
+
+// A signal in the middle of a run, through the first invocation (which passes
+// it on) or straight to the installing run: the run stops between files, says
+// why in the log and on standard error, and ends with 128+N; a killed
+// installing run is named by the first invocation.
+struct SignalCase {
+    const char* name;
+    int signal_number;
+    bool to_first;  // else to the installing run
+    int exit_code;
+    std::string err_line;
+};
+void PrintTo(const SignalCase& c, std::ostream* out) {
+    *out << c.name;
+}
+const SignalCase kSignalCases[] = {
+    {"term_to_the_installing_run", SIGTERM, false, 143, "Error: Interrupted by signal <15>\n"},
+    {"term_to_the_first_invocation", SIGTERM, true, 143, "Error: Interrupted by signal <15>\n"},
+    {"int_to_the_first_invocation", SIGINT, true, 130, "Error: Interrupted by signal <2>\n"},
+    {"hup_to_the_installing_run", SIGHUP, false, 129, "Error: Interrupted by signal <1>\n"},
+    {"kill_to_the_installing_run", SIGKILL, false, 137,
+     "Error: The installing run was ended by signal <9>\n"},
+};
+
+class Signals : public ::testing::TestWithParam<SignalCase> {};
+
+TEST_P(Signals, StopBetweenFilesWithTheirStatusAndLine) {
+    const SignalCase& c = GetParam();
+    SampleInstall s;
+    // Hundreds of files, so that the run is still copying when the signal comes.
+    shape(s, {"many T/wide 300", "many A/lib/wide 100", "many A/bin/wide 100"});
+    const std::string out = s.root / "out";
+    const int fd = ::open(out.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, 0644);
+    const pid_t first = start(s, {change_options(1), true}, fd);
+    ::close(fd);
+    // Copies have begun once the first file of the image has landed.
+    ASSERT_TRUE(poll_until([&] {
+        return installing_pid(s) != 0 && zr7test::exists(s.tables() + "/ATTRLIB/kzr.atr");
+    }));
+    ::kill(c.to_first ? first : installing_pid(s), c.signal_number);
+    EXPECT_EQ(wait_for(first), c.exit_code) << read_file(out);
+    const std::string err = read_file(out), log = read_file(s.home + "/logs/qsdinst.log");
+    EXPECT_NE(err.find(c.err_line), std::string::npos) << err;
+    if (c.signal_number != SIGKILL) {
+        EXPECT_TRUE(zr7test::has_trace_line(log, c.err_line.substr(0, c.err_line.size() - 1)))
+            << log.substr(log.size() > 3000 ? log.size() - 3000 : 0);
+        EXPECT_NE(log.find("Exiting with rc <" + std::to_string(c.exit_code) + ">"), log.npos);
+        EXPECT_EQ(err.find("installing run was ended"), std::string::npos) << err;
+        // Stopped early: the later trees are not (all) there.
+        EXPECT_LT(zr7test::list_dir(s.home + "/lx8266/ms/bin/wide").size(), 100u);
+        // Nothing half-copied is left; a SIGKILL may leave a scratch file
+        // (never taken for the file).
+        EXPECT_EQ(copy_scratch(s.home), std::vector<std::string>{});
+    }
+    const std::string vxaenv = read_file(s.vxaenv);
+    EXPECT_TRUE(vxaenv == zr7test::kSampleVxaenv || vxaenv == changed_by(zr7test::kSampleVxaenv, 1))
+        << vxaenv;
+    ::kill(-first, SIGKILL);  // nothing of the run may outlive the test
+}
+
+INSTANTIATE_TEST_SUITE_P(All, Signals, ::testing::ValuesIn(kSignalCases),
+                         [](const ::testing::TestParamInfo<SignalCase>& c) {
+                             return c.param.name;
+                         });
+
+// The environment of the runs a test starts, for the test's length.
+class ScopedEnv {
+  public:
+    ScopedEnv(const char* name, const char* value) : name_(name) { ::setenv(name, value, 1); }
+    ~ScopedEnv() { ::unsetenv(name_); }
+    ScopedEnv(const ScopedEnv&) = delete;
+    ScopedEnv& operator=(const ScopedEnv&) = delete;
+
+  private:
+    const char* name_;
+};
+
+// Forks a process that holds a lock on `dir` until it is killed: with the
+// installer's own lock, or as uid 65534 with a flock on the directory itself.
+pid_t hold_lock(const std::string& dir, bool as_nobody) {
+    int ready[2];
+    if (::pipe(ready) != 0)
+        return -1;
+    std::fflush(nullptr);
+    const pid_t pid = ::fork();
+    if (pid == 0) {
+        bool held = false;
+        if (as_nobody) {
+            const int fd = ::setgid(65534) == 0 && ::setuid(65534) == 0
+                               ? ::open(dir.c_str(), O_RDONLY | O_DIRECTORY)
+                               : -1;
+            held = fd >= 0 && ::flock(fd, LOCK_EX | LOCK_NB) == 0;
+        } else {
+            held = (new zr7::DirectoryLock(dir))->locked();  // held until the kill
+        }
+        (void)!::write(ready[1], held ? "y" : "n", 1);
+        for (;;)
+            ::pause();
+    }
+    ::close(ready[1]);
+    char held = 'n';
+    const bool told = ::read(ready[0], &held, 1) == 1;
+    ::close(ready[0]);
+    return told && held == 'y' ? pid : -1;
+}
+
+// Another installation holds the server: the run says that it waits, for whom,
+// and gives up with -10 after ZR7_LOCK_WAIT seconds.
+TEST(Locks, AHeldServerIsWaitedForThenGivenUp) {
+    SampleInstall s;
+    const pid_t holder = hold_lock(s.home + "/", false);
+    ASSERT_GT(holder, 0);
+    ScopedEnv wait("ZR7_LOCK_WAIT", "1");
+    const auto began = std::chrono::steady_clock::now();
+    const zr7test::RunResult r = run_tool(s, {change_options(1)});
+    const auto took = std::chrono::steady_clock::now() - began;
+    ::kill(holder, SIGKILL);
+    wait_for(holder);
+    const std::string who = ::geteuid() == 0 ? " (pid <" + std::to_string(holder) + ">)" : "";
+    EXPECT_EQ(r.exit_code, 246) << r.out;
+    EXPECT_NE(r.out.find("Waiting for another installation in <" + s.home + "/>" + who + "\n"),
+              r.out.npos)
+        << r.out;
+    EXPECT_NE(r.out.find("Error: Another installation holds <" + s.home + "/>" + who +
+                         "; gave up after <1> s\n"),
+              r.out.npos)
+        << r.out;
+    EXPECT_NE(r.out.find("Exiting with rc <-10>"), r.out.npos);
+    EXPECT_GE(took, std::chrono::seconds(1));
+    EXPECT_EQ(read_file(s.vxaenv), zr7test::kSampleVxaenv);
+    EXPECT_FALSE(zr7test::exists(s.tables() + "/ATTRLIB/kzr.atr"));  // nothing copied
+}
+
+// A signal ends the wait at once, as it would end the run.
+TEST(Locks, ASignalEndsTheWait) {
+    SampleInstall s;
+    const pid_t holder = hold_lock(s.home + "/", false);
+    ASSERT_GT(holder, 0);
+    ScopedEnv wait("ZR7_LOCK_WAIT", "60");
+    const std::string out = s.root / "out";
+    const int fd = ::open(out.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, 0644);
+    const pid_t run = start(s, {change_options(1)}, fd);
+    ::close(fd);
+    EXPECT_TRUE(
+        poll_until([&] { return read_file(out).find("Waiting for") != std::string::npos; }));
+    const auto signalled = std::chrono::steady_clock::now();
+    ::kill(run, SIGTERM);
+    EXPECT_EQ(wait_for(run), 143) << read_file(out);
+    EXPECT_LT(std::chrono::steady_clock::now() - signalled, std::chrono::seconds(10));
+    ::kill(holder, SIGKILL);
+    wait_for(holder);
+    EXPECT_NE(read_file(out).find("Error: Interrupted by signal <15>\n"), std::string::npos);
+    EXPECT_EQ(read_file(s.vxaenv), zr7test::kSampleVxaenv);
+}
+
+// As root, an account that can merely open the installation directory cannot
+// stall an installation by locking it.
+TEST(Locks, AsRootAnUnprivilegedFlockStallsNothing) {
+    if (::geteuid() != 0)
+        GTEST_SKIP() << "the root rule";
+    SampleInstall s(zr7test::reachable_dir());
+    ::chmod(s.root.path().c_str(), 0755);
+    const pid_t squatter = hold_lock(s.home, true);
+    ASSERT_GT(squatter, 0);
+    ScopedEnv wait("ZR7_LOCK_WAIT", "1");
+    const zr7test::RunResult r = run_tool(s, {change_options(1)});
+    ::kill(squatter, SIGKILL);
+    wait_for(squatter);
+    EXPECT_EQ(r.exit_code, 0) << r.out;
+    EXPECT_EQ(r.out.find("Waiting for another installation"), r.out.npos) << r.out;
+    EXPECT_EQ(read_file(s.vxaenv), changed_by(zr7test::kSampleVxaenv, 1));
 }
 
 }  // namespace

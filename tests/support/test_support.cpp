@@ -78,9 +78,47 @@ std::vector<std::string> list_dir(const std::string& path) {
     return names;
 }
 
-TempDir::TempDir() : path_(fs::temp_directory_path() / "zr7test.XXXXXX") {
+TempDir::TempDir(const std::string& parent)
+    : path_((parent.empty() ? fs::temp_directory_path() : fs::path(parent)) / "zr7test.XXXXXX") {
     if (::mkdtemp(path_.data()) == nullptr)
         throw std::runtime_error("mkdtemp failed");
+}
+
+namespace {
+
+// The reachable directory of this test program; removed at its end by the
+// process that made it (not by a forked child that happens to exit).
+class Reachable {
+  public:
+    Reachable() : maker_(::getpid()), path_("/tmp/zr7reach.XXXXXX") {
+        if (::mkdtemp(path_.data()) == nullptr || ::chmod(path_.c_str(), 0755) != 0)
+            throw std::runtime_error("cannot make " + path_);
+        make_dirs(path_ + "/bin");
+        ::chmod((path_ + "/bin").c_str(), 0755);
+        for (const char* name : {"zr7inst", "qdsload"}) {
+            const std::string from = bin_dir() + "/" + name, to = path_ + "/bin/" + name;
+            std::error_code error;
+            if (exists(from) && !fs::copy_file(from, to, error))
+                throw std::runtime_error("cannot copy " + from + ": " + error.message());
+            ::chmod(to.c_str(), 0755);
+        }
+    }
+    ~Reachable() {
+        if (::getpid() == maker_)
+            remove_tree(path_);
+    }
+    const std::string& path() const { return path_; }
+
+  private:
+    pid_t maker_;
+    std::string path_;
+};
+
+}  // namespace
+
+const std::string& reachable_dir() {
+    static const Reachable reachable;
+    return reachable.path();
 }
 
 RunResult run(const std::string& program, const std::vector<std::string>& args,
@@ -117,7 +155,8 @@ RunResult run(const std::string& program, const std::vector<std::string>& args,
             read_file(capture / "out"), options.stderr_path.empty() ? read_file(err) : ""};
 }
 
-SampleInstall::SampleInstall() {  // paths ending in "/" are directories
+SampleInstall::SampleInstall(const std::string& parent)
+    : root(parent) {  // paths ending in "/" are directories
     const std::string t = tables() + "/", c = cicatrsq() + "/", ms = home + "/lx8266/ms/";
     const std::string m = image + "/MSRV/", a = m + "lx8266/";
     // clang-format off

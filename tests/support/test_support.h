@@ -17,10 +17,11 @@ bool exists(const std::string& path);  // a link counts, wherever it points
 void remove_tree(const std::string& path);
 std::vector<std::string> list_dir(const std::string& path);  // sorted, no "." or ".."
 
-// A fresh scratch directory, removed with its contents when the object goes away.
+// A fresh scratch directory, removed with its contents when the object goes away;
+// under `parent` when one is given, else under the system's scratch directory.
 class TempDir {
   public:
-    TempDir();
+    explicit TempDir(const std::string& parent = "");
     ~TempDir() { remove_tree(path_); }
     TempDir(const TempDir&) = delete;
     TempDir& operator=(const TempDir&) = delete;
@@ -52,13 +53,25 @@ inline std::string tool_path() {
     return bin_dir() + "/zr7inst";
 }
 
+// A directory that any account can reach, for tests that run the tool as an
+// unprivileged user: the build tree may lie where only its owner can enter.
+// Made once per test program under /tmp with mode 0755, it holds copies of the
+// tool and the stand-in loader (under bin/) and the scratch directories of
+// those tests; it is removed when the test program ends.
+const std::string& reachable_dir();
+inline std::string reachable_bin_dir() {
+    return reachable_dir() + "/bin";
+}
+
 // A server home (kmsenv: server SRV1, arch lx8266, ip.pipe port 1918; VXAENV; table
 // directories; ms/lib, ms/bin, logs) and an image with a file wherever the tool reads.
 struct SampleInstall {
     TempDir root;
     std::string home = root / "home", image = root / "image";  // without trailing "/"
     std::string server = "SRV1", arch = "lx8266", vxaenv = tables() + "/VXAENV";
-    SampleInstall();
+    // The home and the image under `parent` when one is given (reachable_dir()
+    // for a test that runs the tool as another user).
+    explicit SampleInstall(const std::string& parent = "");
     std::string tables() const { return home + "/tables/" + server; }
     std::string cicatrsq() const { return home + "/tables/cicatrsq"; }
 };
