@@ -3,23 +3,37 @@ BUILD_TEST ?= build/asan
 BUILD_REL ?= build/release
 BUILD_FUZZ ?= build/fuzz
 BUILD_MEMCHECK ?= build/memcheck
+BUILD_TIDY ?= build/tidy
 JOBS ?= $(shell nproc)
 FUZZ_SECONDS ?= 60
+# Warnings stop the build in the developers' and CI's targets (test, soak,
+# fuzz, memcheck) and not in a user's (build, demo, bench); WERROR=ON or
+# WERROR=OFF on the command line decides for every target.
+WERROR ?=
+WERROR_DEV = -DZR7_WERROR=$(or $(WERROR),ON)
+WERROR_USER = -DZR7_WERROR=$(or $(WERROR),OFF)
+# The sources `make format` rewrites and `make format-check` checks.
+FORMAT_FILES = $(sort $(shell find qsd tests fuzz tools bench -name '*.cpp' -o -name '*.h'))
 SANITIZER_OPTIONS = ASAN_OPTIONS=detect_leaks=1:abort_on_error=0 \
 	UBSAN_OPTIONS=print_stacktrace=1:halt_on_error=1
 
-.PHONY: all build test soak fuzz memcheck demo bench format clean
+.PHONY: all build test soak fuzz memcheck demo bench format format-check tidy clean
 
 all: build
 
-# The tool and the stand-in loader, optimised; the tests build under `test`.
+# The tool and the stand-in loader alone, optimised; the tests build under
+# `test`, the benchmark under `bench`.
 build:
-	cmake -S . -B $(BUILD_REL) -G Ninja -DCMAKE_BUILD_TYPE=RelWithDebInfo -DZR7_TESTS=OFF
+	cmake -S . -B $(BUILD_REL) -G Ninja -DCMAKE_BUILD_TYPE=RelWithDebInfo -DZR7_TESTS=OFF \
+		-DZR7_BENCH=OFF $(WERROR_USER)
 	cmake --build $(BUILD_REL) -j $(JOBS)
 
 # The whole suite, built with AddressSanitizer and UndefinedBehaviorSanitizer.
+# The benchmark's code and its tests are built here too, so that they keep
+# compiling while nobody runs the benchmark.
 test:
-	cmake -S . -B $(BUILD_TEST) -G Ninja -DCMAKE_BUILD_TYPE=Debug -DZR7_SANITIZE=ON
+	cmake -S . -B $(BUILD_TEST) -G Ninja -DCMAKE_BUILD_TYPE=Debug -DZR7_SANITIZE=ON \
+		-DZR7_BENCH=ON $(WERROR_DEV)
 	cmake --build $(BUILD_TEST) -j $(JOBS)
 	$(SANITIZER_OPTIONS) ctest --test-dir $(BUILD_TEST) --output-on-failure -j $(JOBS)
 
@@ -27,14 +41,16 @@ test:
 # directory), run straight from the test program: they outlast a ctest time
 # limit.
 soak:
-	cmake -S . -B $(BUILD_TEST) -G Ninja -DCMAKE_BUILD_TYPE=Debug -DZR7_SANITIZE=ON
+	cmake -S . -B $(BUILD_TEST) -G Ninja -DCMAKE_BUILD_TYPE=Debug -DZR7_SANITIZE=ON \
+		-DZR7_BENCH=ON $(WERROR_DEV)
 	cmake --build $(BUILD_TEST) -j $(JOBS)
 	ZR7_SOAK=1 $(SANITIZER_OPTIONS) $(BUILD_TEST)/bin/test_robustness
 
 # The fuzz targets, built with clang apart from the main build, each run for
 # FUZZ_SECONDS seconds.
 fuzz:
-	CC=clang CXX=clang++ cmake -S fuzz -B $(BUILD_FUZZ) -G Ninja -DCMAKE_BUILD_TYPE=Debug
+	CC=clang CXX=clang++ cmake -S fuzz -B $(BUILD_FUZZ) -G Ninja -DCMAKE_BUILD_TYPE=Debug \
+		$(WERROR_DEV)
 	cmake --build $(BUILD_FUZZ) -j $(JOBS)
 	FUZZ_SECONDS=$(FUZZ_SECONDS) fuzz/run.sh $(BUILD_FUZZ)
 
@@ -46,7 +62,8 @@ MEMCHECK = $(shell command -v valgrind) -q --error-exitcode=99 --leak-check=full
 	--errors-for-leak-kinds=definite --trace-children=yes \
 	--trace-children-skip=*/cp,*/tr,*/qdsload --log-file=$(CURDIR)/$(BUILD_MEMCHECK)/valgrind/%p.log
 memcheck:
-	cmake -S . -B $(BUILD_MEMCHECK) -G Ninja -DCMAKE_BUILD_TYPE=Debug -DZR7_SANITIZE=OFF
+	cmake -S . -B $(BUILD_MEMCHECK) -G Ninja -DCMAKE_BUILD_TYPE=Debug -DZR7_SANITIZE=OFF \
+		$(WERROR_DEV)
 	cmake --build $(BUILD_MEMCHECK) -j $(JOBS) --target test_e2e
 	rm -rf $(BUILD_MEMCHECK)/valgrind && mkdir -p $(BUILD_MEMCHECK)/valgrind
 	ZR7_TOOL_WRAPPER="$(MEMCHECK)" $(BUILD_MEMCHECK)/bin/test_e2e
@@ -66,12 +83,27 @@ demo: build
 #   make bench BENCH_ARGS="--sizes small --rounds 3 --no-limits"
 BENCH_ARGS ?=
 bench:
-	cmake -S . -B $(BUILD_REL) -G Ninja -DCMAKE_BUILD_TYPE=RelWithDebInfo -DZR7_TESTS=OFF
+	cmake -S . -B $(BUILD_REL) -G Ninja -DCMAKE_BUILD_TYPE=RelWithDebInfo -DZR7_TESTS=OFF \
+		-DZR7_BENCH=ON $(WERROR_USER)
 	cmake --build $(BUILD_REL) -j $(JOBS)
 	$(BUILD_REL)/bin/zr7bench_run $(BENCH_ARGS)
 
 format:
-	find qsd tests fuzz tools bench -name '*.cpp' -o -name '*.h' | xargs clang-format -i
+	clang-format -i $(FORMAT_FILES)
+
+# Fails, naming each file and line, when a source differs from what
+# `make format` would make of it.
+format-check:
+	@clang-format --dry-run -Werror $(FORMAT_FILES)
+	@echo "format-check: $(words $(FORMAT_FILES)) files, all formatted"
+
+# clang-tidy with the checks of .clang-tidy over qsd/ and tools/, from the
+# compile commands of a build folder of its own (configuring it is enough:
+# nothing is compiled). Fails on any finding.
+tidy:
+	cmake -S . -B $(BUILD_TIDY) -G Ninja -DCMAKE_BUILD_TYPE=Debug -DZR7_TESTS=OFF \
+		-DZR7_BENCH=OFF -DZR7_WERROR=OFF
+	tools/ci/tidy.sh $(BUILD_TIDY) $(JOBS)
 
 clean:
 	rm -rf build
