@@ -5,6 +5,7 @@
 #include <unistd.h>
 
 #include <filesystem>
+#include <map>
 #include <regex>
 
 #include "e2e/e2e.h"
@@ -55,6 +56,63 @@ TEST(Install, EveryFileLandsInPlaceWithItsContent) {
 // How a run ends: what came before stays done, what comes after is not done
 // ("": nothing to look at). Through the relaunch the first invocation ends
 // with the same status, and a second run's output follows the first's in the log.
+// Every name, kind and byte below the home, links not followed.
+std::string tree_of(const std::string& dir) {
+    std::string out;
+    for (const fs::directory_entry& e : fs::recursive_directory_iterator(dir)) {
+        out += e.path().string() + (e.is_symlink()     ? " link\n"
+                                    : e.is_directory() ? " dir\n"
+                                                       : " " + read_file(e.path()) + "\n");
+    }
+    return out;
+}
+
+// Failures that the checks foresee, through the relaunch as an administrator
+// runs it: the status, the reason on standard error, and a server untouched.
+TEST(Install, ForeseenFailuresChangeNothing) {
+    // clang-format off
+    const struct { const char* name; void (*prepare)(S); std::vector<std::string> args; int rc;
+                   std::string err; std::map<std::string, std::string> env; } cases[] = {
+        {"mistyped image", [](S) {}, {"-e", "-c", "K=v", "-m", "kzr", "/nonexistent/typo"}, 249,
+         "Error: Can't open </nonexistent/typo/MSRV>\n"},
+        {"image for other architectures", [](S s) {
+             fs::rename(s.image + "/MSRV/lx8266", s.image + "/MSRV/aix536"); },
+         {"-m", "kzr"}, 249, "Error: The image has no tree for the architecture <lx8266>\n"},
+        {"loader not on PATH", [](S) {}, {"-m", "kzr"}, 250, "Error: Can't start <qdsload>",
+         {{"PATH", "/usr/bin:/bin"}}},
+        {"missing destination", [](S s) { remove_tree(s.tables() + "/TECLIB"); }, {"-m", "kzr"},
+         251, "Error: Can't open <"},
+        {"loop in the image", [](S s) {
+             fs::create_directory_symlink("..", s.image + "/MSRV/lx8266/TABLE/sub/up"); },
+         {"-m", "kzr"}, 251, "Error: Directory loop at <"},
+    };
+    // clang-format on
+    for (const auto& c : cases) {
+        SampleInstall s;
+        c.prepare(s);
+        const std::string before = tree_of(s.home);
+        std::vector<std::string> args = {"-h", s.home};
+        args.insert(args.end(), c.args.begin(), c.args.end());
+        if (c.args.empty() || c.args.back()[0] != '/')
+            args.push_back(s.image);
+        RunOptions options;
+        options.set_env = c.env;
+        const RunResult r = tool(args, options);
+        EXPECT_EQ(r.exit_code, c.rc) << c.name << "\n" << r.err;
+        EXPECT_NE(r.err.find(c.err), std::string::npos) << c.name << "\n" << r.err;
+        // The log alone may grow.
+        remove_tree(s.home + "/logs/qsdinst.log");
+        std::string after = tree_of(s.home);
+        std::string was = before;
+        for (std::string* t : {&after, &was}) {
+            const std::size_t log = t->find(s.home + "/logs/qsdinst.log ");
+            if (log != std::string::npos)
+                t->erase(log, t->find('\n', log) - log + 1);
+        }
+        EXPECT_EQ(after, was) << c.name;
+    }
+}
+
 TEST(Install, EachOutcomeEndsTheRunWithItsStatus) {
     const std::string srv = "tables/SRV1/", cic = "tables/cicatrsq/", cat = cic + "qdsload.catalog";
     const std::string atr = srv + "ATTRLIB/kzr.atr";
