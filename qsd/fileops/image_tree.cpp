@@ -15,20 +15,6 @@ constexpr int kMaxLinks = 40;
 constexpr int kStrictDir = O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC;
 constexpr int kReadFile = O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC;
 
-std::vector<std::string> split(const std::string& path) {
-    std::vector<std::string> parts;
-    std::size_t start = 0;
-    while (start <= path.size()) {
-        std::size_t slash = path.find('/', start);
-        if (slash == std::string::npos)
-            slash = path.size();
-        if (slash > start)
-            parts.push_back(path.substr(start, slash - start));
-        start = slash + 1;
-    }
-    return parts;
-}
-
 // Opens the directory at `where` below the root, every step a real
 // directory: the names were checked when they were found, and a link put in
 // their place since is refused here, not followed.
@@ -72,7 +58,7 @@ int resolve_inside(const ImageRoot& root, std::vector<std::string> base, const s
         rest.erase(0, real.size());
         base.clear();
     }
-    for (const std::string& part : split(rest)) {
+    for (const std::string& part : fs::split_path(rest)) {
         if (part == ".")
             continue;
         if (part == "..") {
@@ -222,7 +208,7 @@ int open_image_dir(const ImageRoot& root, const std::string& relative, ImageEntr
         return errno;
     if (::fstat(current.fd.get(), &current.st) != 0)
         return errno;
-    for (const std::string& part : split(relative)) {
+    for (const std::string& part : fs::split_path(relative)) {
         ImageEntry next;
         if (const int failed = open_image_entry(root, current.fd.get(), current.where,
                                                 current.outside, part, next))

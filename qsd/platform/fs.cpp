@@ -40,6 +40,20 @@ std::string error_text(int error) {
     return std::strerror(error);
 }
 
+std::vector<std::string> split_path(const std::string& path) {
+    std::vector<std::string> parts;
+    std::size_t start = 0;
+    while (start <= path.size()) {
+        std::size_t slash = path.find('/', start);
+        if (slash == std::string::npos)
+            slash = path.size();
+        if (slash > start)
+            parts.push_back(path.substr(start, slash - start));
+        start = slash + 1;
+    }
+    return parts;
+}
+
 bool trusted_owner(uid_t uid) {
     return uid == 0 || uid == ::geteuid();
 }
@@ -63,20 +77,6 @@ int dup_fd(int fd, UniqueFd& out) {
         return errno;
     out.reset(copy);
     return 0;
-}
-
-std::vector<std::string> components(const std::string& path) {
-    std::vector<std::string> parts;
-    std::size_t start = 0;
-    while (start <= path.size()) {
-        std::size_t slash = path.find('/', start);
-        if (slash == std::string::npos)
-            slash = path.size();
-        if (slash > start)
-            parts.push_back(path.substr(start, slash - start));
-        start = slash + 1;
-    }
-    return parts;
 }
 
 int read_link(int dir, const std::string& name, std::string& target) {
@@ -131,7 +131,7 @@ int walk_components(int start, const std::string& path, UniqueFd& out, int& link
     UniqueFd current;
     if (const int failed = dup_fd(start, current))
         return failed;
-    for (const std::string& part : components(path)) {
+    for (const std::string& part : split_path(path)) {
         UniqueFd next;
         if (const int failed = step_dir(current.get(), part, next, links_left))
             return failed;

@@ -17,6 +17,7 @@
 #include <sys/types.h>
 
 #include <string>
+#include <vector>
 
 namespace zr7::fs {
 
@@ -47,6 +48,9 @@ constexpr int kUntrustedLink = 100001;
 constexpr int kNotRegular = 100002;
 // The system's text for an error number, or ours for the two above.
 std::string error_text(int error);
+
+// The names of a path between its "/" separators, empty ones left out.
+std::vector<std::string> split_path(const std::string& path);
 
 // Whether a link owned by `uid` may be followed inside the installation.
 bool trusted_owner(uid_t uid);

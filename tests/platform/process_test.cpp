@@ -18,7 +18,7 @@ namespace {
 using zr7::OutputMode;
 using zr7::ProcessSpec;
 
-ProcessSpec spec(const std::string& program, const std::vector<std::string>& args) {
+ProcessSpec job_of(const std::string& program, const std::vector<std::string>& args) {
     ProcessSpec job;
     job.program = program;
     job.args = args;
@@ -74,10 +74,10 @@ TEST(ProcessChild, EndBySignalToldApartFromAnExitStatus) {
         {{"-c", "kill -KILL $$"}, 137, SIGKILL},
         {{"-c", "exit 0"}, 0, 0}};
     for (const auto& [args, status, signal_number] : cases) {
-        const zr7::ProcessResult result = zr7::run_process_ex(spec("sh", args));
+        const zr7::ProcessResult result = zr7::run_process_ex(job_of("sh", args));
         EXPECT_EQ(result.status, status) << args[1];
         EXPECT_EQ(result.signal, signal_number) << args[1];
-        EXPECT_EQ(zr7::run_process(spec("sh", args)), status) << args[1];
+        EXPECT_EQ(zr7::run_process(job_of("sh", args)), status) << args[1];
     }
 }
 
@@ -103,7 +103,7 @@ TEST(ProcessChild, CallersDescriptorsWinOverPaths) {
 // SIGTERM to a process that waits with forwarding on reaches the program and
 // not the waiting process, which gets the program's end as its result.
 TEST(ProcessChild, SignalsPassedOnWhileWaiting) {
-    ProcessSpec job = spec("sleep", {"30"});
+    ProcessSpec job = job_of("sleep", {"30"});
     job.forward_signals = true;
     const pid_t self = ::getpid();
     std::thread sender([self] {
