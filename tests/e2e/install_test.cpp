@@ -74,17 +74,17 @@ TEST(Install, ForeseenFailuresChangeNothing) {
     const struct { const char* name; void (*prepare)(S); std::vector<std::string> args; int rc;
                    std::string err; std::map<std::string, std::string> env; } cases[] = {
         {"mistyped image", [](S) {}, {"-e", "-c", "K=v", "-m", "kzr", "/nonexistent/typo"}, 249,
-         "Error: Can't open </nonexistent/typo/MSRV>\n"},
+         "Error: Can't open </nonexistent/typo/MSRV>\n", {}},
         {"image for other architectures", [](S s) {
              fs::rename(s.image + "/MSRV/lx8266", s.image + "/MSRV/aix536"); },
-         {"-m", "kzr"}, 249, "Error: The image has no tree for the architecture <lx8266>\n"},
+         {"-m", "kzr"}, 249, "Error: The image has no tree for the architecture <lx8266>\n", {}},
         {"loader not on PATH", [](S) {}, {"-m", "kzr"}, 250, "Error: Can't start <qdsload>",
          {{"PATH", "/usr/bin:/bin"}}},
         {"missing destination", [](S s) { remove_tree(s.tables() + "/TECLIB"); }, {"-m", "kzr"},
-         251, "Error: Can't open <"},
+         251, "Error: Can't open <", {}},
         {"loop in the image", [](S s) {
              fs::create_directory_symlink("..", s.image + "/MSRV/lx8266/TABLE/sub/up"); },
-         {"-m", "kzr"}, 251, "Error: Directory loop at <"},
+         {"-m", "kzr"}, 251, "Error: Directory loop at <", {}},
     };
     // clang-format on
     for (const auto& c : cases) {
