@@ -41,7 +41,9 @@ std::string run_header_line(const std::string& time_text, const std::string& use
                             const std::string& cwd, int argc, char* const* argv);
 
 // The last trace line of an installing run, from its status and progress.
-std::string run_closing_line(int status, const ProgressState& state, double elapsed_seconds);
+// `journal_seconds` is the time the run spent keeping its journal.
+std::string run_closing_line(int status, const ProgressState& state, double elapsed_seconds,
+                             double journal_seconds);
 
 // What the record of a run in qsdinst.json says.
 struct RunRecord {

@@ -235,7 +235,9 @@ int run_main(int argc, char** argv) {
         if (status == 0)
             status = -8;
     }
-    ZR7_DETAIL("%s", run_closing_line(status, progress.state(), seconds_since(started)).c_str());
+    ZR7_DETAIL("%s", run_closing_line(status, progress.state(), seconds_since(started),
+                                      installer.journal ? installer.journal->seconds() : 0.0)
+                         .c_str());
     ZR7_RETURN(status);
 }
 

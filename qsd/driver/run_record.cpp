@@ -30,11 +30,12 @@ std::string run_header_line(const std::string& time_text, const std::string& use
            user_name + "(" + std::to_string(uid) + "), cwd " + cwd + ", command " + command;
 }
 
-std::string run_closing_line(int status, const ProgressState& state, double elapsed_seconds) {
+std::string run_closing_line(int status, const ProgressState& state, double elapsed_seconds,
+                             double journal_seconds) {
     return "zr7inst run ends: rc " + std::to_string(status) + ", files copied " +
            std::to_string(state.files_copied) + ", files seeded " +
            std::to_string(state.files_seeded) + ", VXAENV " + env_outcome(state) + ", elapsed " +
-           elapsed_text(elapsed_seconds) + " s";
+           elapsed_text(elapsed_seconds) + " s, journal " + elapsed_text(journal_seconds) + " s";
 }
 
 std::string run_record_json(const RunRecord& record) {

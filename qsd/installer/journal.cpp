@@ -1,8 +1,28 @@
 #include "qsd/installer/journal.h"
 
 #include <cerrno>
+#include <chrono>
 
 namespace zr7 {
+
+namespace {
+
+// Adds the time from its making to its end to a total.
+class Stopwatch {
+  public:
+    explicit Stopwatch(double& total) : total_(total), began_(std::chrono::steady_clock::now()) {}
+    ~Stopwatch() {
+        total_ += std::chrono::duration<double>(std::chrono::steady_clock::now() - began_).count();
+    }
+    Stopwatch(const Stopwatch&) = delete;
+    Stopwatch& operator=(const Stopwatch&) = delete;
+
+  private:
+    double& total_;
+    std::chrono::steady_clock::time_point began_;
+};
+
+}  // namespace
 
 int Journal::open(int run_dir) {
     if (const int error = fs::make_private_dir(run_dir, kKeptDir, kept_dir_))
@@ -53,6 +73,7 @@ int Journal::keep(int dir, const std::string& name, std::string& kept) {
 }
 
 int Journal::before_mkdir(const std::string& shown) {
+    const Stopwatch watch(seconds_);
     const std::string path = relative(shown);
     if (path.empty() || !listed_.insert(path).second)
         return 0;
@@ -61,6 +82,7 @@ int Journal::before_mkdir(const std::string& shown) {
 
 int Journal::before_write(int dir, const std::string& name, const std::string& shown,
                           Action action) {
+    const Stopwatch watch(seconds_);
     const std::string path = relative(shown);
     // A file the run wrote already keeps the first version it had.
     if (!file_.valid() || path.empty() || !listed_.insert(path).second)
@@ -76,6 +98,7 @@ int Journal::before_write(int dir, const std::string& name, const std::string& s
 }
 
 int Journal::after_write(int dir, const std::string& name, const std::string& shown) {
+    const Stopwatch watch(seconds_);
     const std::string path = relative(shown);
     if (!file_.valid() || path.empty())
         return 0;
@@ -91,6 +114,7 @@ int Journal::after_write(int dir, const std::string& name, const std::string& sh
 }
 
 int Journal::note(const std::string& kind, const std::string& shown) {
+    const Stopwatch watch(seconds_);
     const std::string path = relative(shown);
     if (path.empty())
         return 0;

@@ -35,6 +35,9 @@ class Journal : public ChangeJournal {
     int after_write(int dir, const std::string& name, const std::string& shown) override;
     // A line of another kind ("backup", "seed") for a path the run shows.
     int note(const std::string& kind, const std::string& shown);
+    // The time spent keeping the journal so far, in seconds: its cost shows
+    // in the log's closing line.
+    double seconds() const { return seconds_; }
 
   private:
     // The path below the installation directory, "" for one outside it.
@@ -49,6 +52,7 @@ class Journal : public ChangeJournal {
     fs::UniqueFd file_;
     std::set<std::string> listed_;  // paths whose first version is accounted for
     unsigned kept_count_ = 0;
+    double seconds_ = 0;
 };
 
 }  // namespace zr7

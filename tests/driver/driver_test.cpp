@@ -125,17 +125,17 @@ TEST(RunRecord, HeaderAndClosingLines) {
     const std::tuple<bool, bool, int, double, std::string> cases[] = {
         {false, false, 0, 1.2344,
          "rc 0, files copied 12, files seeded 2, VXAENV not updated, "
-         "elapsed 1.234 s"},
+         "elapsed 1.234 s, journal 0.000 s"},
         {true, false, -5, 0.0,
          "rc -5, files copied 12, files seeded 2, VXAENV unchanged, "
-         "elapsed 0.000 s"},
+         "elapsed 0.000 s, journal 0.000 s"},
         {true, true, -6, 61.5,
          "rc -6, files copied 12, files seeded 2, VXAENV changed, "
-         "elapsed 61.500 s"}};
+         "elapsed 61.500 s, journal 0.000 s"}};
     for (const auto& [reported, changed, status, seconds, text] : cases) {
         state.env_reported = reported;
         state.env_changed = changed;
-        EXPECT_EQ(zr7::run_closing_line(status, state, seconds), "zr7inst run ends: " + text);
+        EXPECT_EQ(zr7::run_closing_line(status, state, seconds, 0.0), "zr7inst run ends: " + text);
     }
     EXPECT_TRUE(std::regex_match(zr7::iso_local_time(0),
                                  std::regex(R"(19(69|70)-\d\d-\d\dT\d\d:\d\d:\d\d[+-]\d{4})")))
