@@ -72,6 +72,8 @@ playbook() {
 }
 
 started=$(date +%s)
+# The module's documentation must parse, as ansible-doc shows it.
+ansible-doc -t module zr7inst >/dev/null
 if command -v ansible-lint >/dev/null 2>&1; then
     echo "===== ansible-lint"
     (cd "$repo" && ansible-lint --offline -p contrib/ansible/rollout.yml contrib/ansible/undo.yml \
