@@ -4,13 +4,14 @@
 
 #include <string>
 
-#include "qsd/platform/progress.h"
+#include "qsd/driver/progress.h"
+#include "qsd/text/plan.h"
 #include "qsd/text/text.h"
 
 namespace zr7 {
 
 constexpr const char* kVrmf = "06100400";
-constexpr const char* kOptionString = "c:efh:m:o:sv:V";
+constexpr const char* kOptionString = "c:efh:m:no:sv:V";
 
 // What main does; returns the process status.
 int run_main(int argc, char** argv);
@@ -42,6 +43,24 @@ std::string run_header_line(const std::string& time_text, const std::string& use
 // The last trace line of an installing run, from its status and progress.
 std::string run_closing_line(int status, const ProgressState& state, double elapsed_seconds);
 
+// What the record of a run in qsdinst.json says.
+struct RunRecord {
+    std::string operation = "install";  // or "undo"
+    std::string run;                    // the run's directory in the store
+    std::string start;                  // iso_local_time
+    std::string end;
+    StringList arguments;  // the administrator's, without the relaunch's "-o <logdir>"
+    std::string home;
+    std::string image;  // "" for none
+    int rc = 0;         // the run's status; the exit status is its low byte
+    const Plan* plan = nullptr;
+    std::string backup;    // the environment file's backup, "" for none
+    StringList errors;     // the "Error:" lines
+    std::string manifest;  // "" for none
+};
+// The record as one JSON object on one line, without the line break.
+std::string run_record_json(const RunRecord& record);
+
 // The local time as "2026-12-07T01:45:09+0000".
 std::string iso_local_time(long seconds_since_epoch);
 
@@ -71,7 +90,29 @@ std::string image_msrv_path(const std::string& src_dir);
 // The first invocation's checks before the relaunch: the installation
 // directory, the image's MSRV directory and the log directory exist. 0, or
 // -7 / -8 after a line on standard error.
-int check_before_relaunch(const std::string& home, const std::string& src_dir);
+// `reason` (when given) receives the line, unescaped.
+int check_before_relaunch(const std::string& home, const std::string& src_dir,
+                          std::string* reason = nullptr);
+
+}  // namespace zr7
+
+class Installer610;
+
+namespace zr7 {
+
+// The preview (-n): the installing run's checks and plan in this process,
+// nothing changed, no log; the plan on standard output. Returns the status
+// the run would end with.
+int run_preview(Installer610& installer, const std::string& home, const std::string& src_dir);
+
+// Keeps the record of an installing run that ended with `status`: its
+// manifest in the installation's run store, and one line in
+// <logdir>/qsdinst.json. Returns `status`, or -8 when a successful run
+// could not keep its record.
+int keep_run_record(Installer610& installer, RunRecord& record, int status);
+
+// The image's MSRV path as the installing run names it: src_dir, "/", "MSRV/".
+std::string image_source_path(const std::string& src_dir);
 
 // Exit status when the second run cannot be started at all, the status a
 // shell gives a command it cannot find.

@@ -26,25 +26,29 @@ std::string image_msrv_path(const std::string& src_dir) {
     return path + "MSRV";
 }
 
-int check_before_relaunch(const std::string& home, const std::string& src_dir) {
-    std::fflush(stdout);
-    if (!is_directory(home)) {
-        std::fprintf(stderr, "Error: Installation directory <%s> does not exist\n",
-                     escape_controls(home).c_str());
-        return -7;
-    }
+int check_before_relaunch(const std::string& home, const std::string& src_dir,
+                          std::string* reason) {
+    std::string line;
+    int status = 0;
     const std::string msrv = image_msrv_path(src_dir);
-    if (!is_directory(msrv)) {
-        std::fprintf(stderr, "Error: Can't open <%s>\n", escape_controls(msrv).c_str());
-        return -7;
-    }
     const std::string logs = log_dir_for(home);
-    if (!is_directory(logs)) {
-        std::fprintf(stderr, "Error: Log directory <%s> does not exist\n",
-                     escape_controls(logs).c_str());
-        return -8;
+    if (!is_directory(home)) {
+        line = "Error: Installation directory <" + home + "> does not exist";
+        status = -7;
+    } else if (!is_directory(msrv)) {
+        line = "Error: Can't open <" + msrv + ">";
+        status = -7;
+    } else if (!is_directory(logs)) {
+        line = "Error: Log directory <" + logs + "> does not exist";
+        status = -8;
     }
-    return 0;
+    if (status != 0) {
+        std::fflush(stdout);
+        std::fprintf(stderr, "%s\n", escape_controls(line).c_str());
+        if (reason != nullptr)
+            *reason = line;
+    }
+    return status;
 }
 
 }  // namespace zr7

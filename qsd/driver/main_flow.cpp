@@ -11,7 +11,6 @@
 #include "qsd/driver/getopt.h"
 #include "qsd/installer/installer610.h"
 #include "qsd/platform/interruption.h"
-#include "qsd/platform/progress.h"
 #include "qsd/platform/trace.h"
 #include "qsd/text/escape.h"
 
@@ -52,6 +51,12 @@ double seconds_since(std::chrono::steady_clock::time_point start) {
     return std::chrono::duration<double>(std::chrono::steady_clock::now() - start).count();
 }
 
+// Where the administrator's arguments begin in the installing run's
+// vector: after the "-o <logdir>" that the relaunch put first.
+int relaunched_arguments_start(int argc, char** argv) {
+    return argc > 2 && std::strcmp(argv[1], "-o") == 0 ? 3 : 1;
+}
+
 }  // namespace
 
 int run_main(int argc, char** argv) {
@@ -61,6 +66,7 @@ int run_main(int argc, char** argv) {
     std::string home;
     std::string source;
     int relaunched = 0;
+    bool preview = false;      // -n
     bool env_options = false;  // -c or -m given
     GetOpt options(argc, argv, kOptionString);
 
@@ -115,6 +121,9 @@ int run_main(int argc, char** argv) {
                 }
                 installer.module_name = options.argument;
                 break;
+            case 'n':
+                preview = true;
+                break;
             case 'o':
                 installer.log_dir = options.argument;
                 relaunched = 1;
@@ -143,6 +152,9 @@ int run_main(int argc, char** argv) {
     if (home.back() != '/')
         home += '/';
 
+    if (preview)
+        ZR7_RETURN(run_preview(installer, home, argv[options.index]));
+
     if (relaunched == 0) {
         int status = check_before_relaunch(home, argv[options.index]);
         if (status == 0)
@@ -156,7 +168,14 @@ int run_main(int argc, char** argv) {
     trace_echo_errors(true);
     catch_interruptions();
     ignore_file_size_signal();
-    progress_enable(progress_wanted(::isatty(STDERR_FILENO) == 1, ::isatty(STDOUT_FILENO) == 1));
+    ProgressDisplay progress(
+        progress_wanted(::isatty(STDERR_FILENO) == 1, ::isatty(STDOUT_FILENO) == 1));
+    installer.observer = &progress;
+    trace_collect_errors(&installer.error_lines);
+    RunRecord record;
+    record.start = iso_local_time(static_cast<long>(std::time(nullptr)));
+    for (int i = relaunched_arguments_start(argc, argv); i < argc; ++i)
+        record.arguments.emplace_back(argv[i]);
     const std::string log_file = installer.log_dir + "qsdinst.log";
 
     if (zr7_trace.detail()) {
@@ -177,10 +196,7 @@ int run_main(int argc, char** argv) {
         ZR7_DETAIL("%s", kSkipped);
     }
 
-    source = argv[options.index];
-    if (source.back() != '/')
-        source += '/';
-    source += "MSRV/";
+    source = image_source_path(argv[options.index]);
 
     int status = installer.init(source, home);
     if (status == 0) {
@@ -188,7 +204,15 @@ int run_main(int argc, char** argv) {
         std::fflush(stdout);
         status = installer.go();
     }
-    progress_finish(status, log_file, seconds_since(started));
+    installer.finish_plan(status);
+    record.end = iso_local_time(static_cast<long>(std::time(nullptr)));
+    record.home =
+        installer.working_dir.empty() || home[0] == '/' ? home : installer.working_dir + "/" + home;
+    record.image = argv[options.index];
+    record.backup = progress.state().backup;
+    status = keep_run_record(installer, record, status);
+    trace_collect_errors(nullptr);
+    progress.finish(status, installer.plan.summary().substr(9), log_file, seconds_since(started));
     status = finish(zr7_trace, zr7_unit, status);
     // Standard output is the log, the run's record. When some of it could
     // not be written (a full disk), the run says so where it still can and
@@ -198,7 +222,7 @@ int run_main(int argc, char** argv) {
         if (status == 0)
             status = -8;
     }
-    ZR7_DETAIL("%s", run_closing_line(status, progress_state(), seconds_since(started)).c_str());
+    ZR7_DETAIL("%s", run_closing_line(status, progress.state(), seconds_since(started)).c_str());
     ZR7_RETURN(status);
 }
 

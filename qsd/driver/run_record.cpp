@@ -4,6 +4,7 @@
 #include <ctime>
 
 #include "qsd/driver/driver.h"
+#include "qsd/text/json.h"
 
 namespace zr7 {
 
@@ -34,6 +35,40 @@ std::string run_closing_line(int status, const ProgressState& state, double elap
            std::to_string(state.files_copied) + ", files seeded " +
            std::to_string(state.files_seeded) + ", VXAENV " + env_outcome(state) + ", elapsed " +
            elapsed_text(elapsed_seconds) + " s";
+}
+
+std::string run_record_json(const RunRecord& record) {
+    JsonObject counts;
+    bool changed = false;
+    if (record.plan != nullptr) {
+        std::size_t n = 0;
+        const Action* actions = record.plan->actions(n);
+        for (std::size_t i = 0; i < n; ++i)
+            counts.add(action_name(actions[i]), static_cast<long>(record.plan->count(actions[i])));
+        changed = record.plan->changed();
+    }
+    JsonObject json;
+    json.add("operation", record.operation).add("run", record.run);
+    json.add("start", record.start).add("end", record.end).add("version", kVrmf);
+    json.add("arguments", record.arguments).add("home", record.home);
+    if (record.image.empty())
+        json.add_null("image");
+    else
+        json.add("image", record.image);
+    json.add("status", record.rc == 0 ? "success" : "failure");
+    json.add("rc", static_cast<long>(record.rc))
+        .add("exit_status", static_cast<long>(record.rc & 0xFF));
+    json.add("changed", changed).add("counts", counts);
+    if (record.backup.empty())
+        json.add_null("backup");
+    else
+        json.add("backup", record.backup);
+    json.add("errors", record.errors);
+    if (record.manifest.empty())
+        json.add_null("manifest");
+    else
+        json.add("manifest", record.manifest);
+    return json.text();
 }
 
 std::string iso_local_time(long seconds_since_epoch) {

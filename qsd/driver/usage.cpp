@@ -27,6 +27,8 @@ const char* const kUsageLines =
 
 // Options added since: one line each, after the fourteen.
 const char* const kAddedOptionLines[] = {
+    "  -n       Preview: print each change the installation would make,\n"
+    "           and change nothing.\n",
     "  --help   Print this text on standard output and exit.\n",
     "  --version Print the version line on standard output and exit.\n",
 };

@@ -82,6 +82,23 @@ int backup_content_at(int base_fd, const std::string& base_shown, const std::str
     ZR7_RETURN(0);
 }
 
+std::string planned_backup_path(int base_fd, const std::string& base_shown, const std::string& file,
+                                unsigned stamp,
+                                const std::function<bool(const std::string&)>& taken) {
+    const std::string archive = join(base_shown, ".archive");
+    fs::UniqueFd archive_fd;
+    const bool has_archive = fs::open_dir_below(base_fd, ".archive", archive_fd) == 0;
+    for (unsigned tries = 0; tries < kMaxStampTries; ++tries, ++stamp) {
+        const std::string name = backup_name(file, stamp);
+        struct stat st {};
+        if ((!has_archive || fs::stat_at(archive_fd.get(), name, st) != 0) &&
+            !taken(join(archive, name))) {
+            return join(archive, name);
+        }
+    }
+    return join(archive, backup_name(file, stamp));
+}
+
 int backup_file(const char* dir, const char* file, const char* base, unsigned stamp,
                 std::string& made) {
     made.clear();

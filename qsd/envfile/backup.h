@@ -4,6 +4,7 @@
 #pragma once
 
 #include <ctime>
+#include <functional>
 #include <string>
 
 namespace zr7 {
@@ -20,6 +21,13 @@ unsigned backup_stamp(std::time_t now);
 // `made`, or -9.
 int backup_content_at(int base_fd, const std::string& base_shown, const std::string& file,
                       const std::string& content, unsigned mode, unsigned stamp, std::string& made);
+
+// The path backup_content_at would give the backup now, changing nothing:
+// the first stamp from `stamp` on whose name is free in `base_fd`'s
+// .archive and not `taken` (the backups a preview has already planned).
+std::string planned_backup_path(int base_fd, const std::string& base_shown, const std::string& file,
+                                unsigned stamp,
+                                const std::function<bool(const std::string&)>& taken);
 
 // The same for a file read from `dir`/`file`, into `base`/.archive, by path.
 int backup_file(const char* dir, const char* file, const char* base, unsigned stamp,

@@ -16,7 +16,6 @@
 #include "qsd/installer/installer610.h"
 #include "qsd/platform/directory_lock.h"
 #include "qsd/platform/fs.h"
-#include "qsd/platform/progress.h"
 #include "qsd/platform/trace.h"
 
 namespace {
@@ -99,7 +98,6 @@ int Installer610::update_vxaenv(const std::string& dir_template) {
     if (error != 0) {
         ZR7_ERROR("Error: Can't open <%s>", env_path.c_str());
         ZR7_ERROR("Error: <%s>: %s", env_path.c_str(), zr7::fs::error_text(error).c_str());
-        zr7::progress_env_result(false, "");
         ZR7_RETURN(-7);
     }
 
@@ -114,7 +112,8 @@ int Installer610::update_vxaenv(const std::string& dir_template) {
         // Nothing is written, not even a scratch file: the file and its
         // directory keep their times, and a read-only directory is no error.
         ZR7_DETAIL("VXAENV is unmodified");
-        zr7::progress_env_result(false, "");
+        if (observer != nullptr)
+            observer->on_env_result(false);
         ZR7_RETURN(0);
     }
 
@@ -141,11 +140,18 @@ int Installer610::update_vxaenv(const std::string& dir_template) {
                                       zr7::backup_stamp(std::time(nullptr)), backup) != 0) {
         ZR7_ERROR("Error: Can't backup VXAENV");
         status = -9;
-    } else if ((error = replace.commit()) != 0) {
-        ZR7_ERROR("Error: Can't copy <%s> to <%s>", new_path.c_str(), env_path.c_str());
-        ZR7_ERROR("Error: <%s>: %s", env_path.c_str(), zr7::fs::error_text(error).c_str());
-        status = -5;
+    } else {
+        on_action(zr7::Action::kBackup, backup, "");
+        if ((error = replace.commit()) != 0) {
+            ZR7_ERROR("Error: Can't copy <%s> to <%s>", new_path.c_str(), env_path.c_str());
+            ZR7_ERROR("Error: <%s>: %s", env_path.c_str(), zr7::fs::error_text(error).c_str());
+            status = -5;
+        } else {
+            on_action(zr7::Action::kVxaenv, env_path,
+                      zr7::unified_diff(content, new_content, "VXAENV"));
+        }
     }
-    zr7::progress_env_result(status == 0, status == 0 ? backup : std::string());
+    if (observer != nullptr && status == 0)
+        observer->on_env_result(true);
     ZR7_RETURN(status);
 }

@@ -9,10 +9,10 @@
 #include <utility>
 
 #include "qsd/fileops/copy_at.h"
+#include "qsd/fileops/copy_options.h"
 #include "qsd/fileops/install_util.h"
 #include "qsd/platform/fs.h"
 #include "qsd/platform/interruption.h"
-#include "qsd/platform/progress.h"
 #include "qsd/platform/trace.h"
 
 namespace zr7 {
@@ -43,10 +43,14 @@ struct Walk {
     const ImageRoot& root;
     unsigned flags;
     const ServerDirGuard& guard;
-    bool check_only;
-    StringList* made;
+    const TreePass& pass;
     std::set<std::pair<dev_t, ino_t>> walked;
 };
+
+void tell(const Walk& w, Action action, const std::string& path) {
+    if (w.pass.sink != nullptr)
+        w.pass.sink->on_action(action, path, "");
+}
 
 bool is_server_dir(const ServerDirGuard& guard, int dir) {
     struct stat st {};
@@ -66,11 +70,12 @@ int walk(Walk& w, const ImageEntry& src, const std::string& src_shown, int dst_d
     }
     const bool server_dir = dst_dir >= 0 && is_server_dir(w.guard, dst_dir);
     // Scratch files of a run that was killed; the run lock keeps live runs out.
-    if (!w.check_only)
+    const bool check_only = w.pass.check_only;
+    if (!check_only)
         fs::remove_stale_scratch(dst_dir, "zr7copy");
     for (const std::string& name : names) {
         // A signal to stop is taken between files, never inside a copy.
-        if (!w.check_only && interruption() != 0)
+        if (!check_only && interruption() != 0)
             ZR7_RETURN(kStatusInterrupted);
         const std::string src_path = src_shown + "/" + name;
         const std::string dst_path = dst_shown + name;
@@ -99,14 +104,19 @@ int walk(Walk& w, const ImageEntry& src, const std::string& src_shown, int dst_d
             }
             fs::UniqueFd sub;
             int error = 0;
-            if (w.check_only) {
+            if (check_only) {
                 struct stat there {};
-                if (dst_dir >= 0 && fs::stat_at(dst_dir, name, there) == 0)
+                if (dst_dir >= 0 && fs::stat_at(dst_dir, name, there) == 0) {
                     error = fs::open_dir_below(dst_dir, name, sub);
-                else
-                    w.made->push_back(dst_path);
+                } else if (!w.pass.planned->has_dir(dst_path)) {
+                    w.pass.planned->add_dir(dst_path);
+                    tell(w, Action::kMkdir, dst_path);
+                }
             } else {
-                error = fs::make_dir(dst_dir, name, sub);
+                bool created = false;
+                error = fs::make_dir(dst_dir, name, sub, &created);
+                if (error == 0 && created)
+                    tell(w, Action::kMkdir, dst_path);
             }
             if (error != 0) {
                 ZR7_ERROR("Error: Unable to create directory <%s>", dst_path.c_str());
@@ -117,23 +127,34 @@ int walk(Walk& w, const ImageEntry& src, const std::string& src_shown, int dst_d
                 ZR7_RETURN(status);
             continue;
         }
-        if (server_dir && name == "VXAENV" && (w.flags & kCopyOverwrite) != 0 &&
-            w.guard.back_up_env_file && !w.check_only) {
+        const bool overwrite = (w.flags & kCopyOverwrite) != 0;
+        const bool strip_cr = (w.flags & kCopyFixCr) != 0;
+        if (server_dir && name == "VXAENV" && overwrite && w.guard.back_up_env_file &&
+            (!check_only || w.pass.sink != nullptr)) {
             if (const int status = w.guard.back_up_env_file())
                 ZR7_RETURN(status);
         }
         ZR7_DETAIL("processing<%s>", dst_path.c_str());
-        const int status = w.check_only ? check_copy_at(entry.fd.get(), entry.st, src_path, dst_dir,
-                                                        name, dst_path)
-                                        : copy_file_at(entry.fd.get(), entry.st, src_path, dst_dir,
-                                                       name, dst_path, w.flags);
+        // What the copy does is told before it copies: afterwards the old
+        // bytes are gone.
+        ContentDigest digest;
+        const Action action = w.pass.sink == nullptr
+                                  ? Action::kCreate
+                                  : copy_outcome(entry.fd.get(), strip_cr, overwrite, dst_dir, name,
+                                                 dst_path, w.pass.planned, digest);
+        const int status =
+            check_only ? check_copy_at(entry.fd.get(), entry.st, src_path, dst_dir, name, dst_path)
+                       : copy_file_at(entry.fd.get(), entry.st, src_path, dst_dir, name, dst_path,
+                                      w.flags);
         if (status != 0) {
             ZR7_ERROR("Error: Copy src <%s> to dst <%s> failed", src_path.c_str(),
                       dst_path.c_str());
             ZR7_RETURN(status);
         }
-        if (!w.check_only)
-            progress_file_copied(dst_path);
+        tell(w, action, dst_path);
+        if (check_only && w.pass.sink != nullptr)
+            plan_copy(*w.pass.planned, action, entry.fd.get(), strip_cr, src_path, dst_path,
+                      digest);
     }
     ZR7_RETURN(0);
 }
@@ -158,18 +179,10 @@ int check_copy_at(int src_fd, const struct stat& src_st, const std::string& src_
     return -5;
 }
 
-int check_tree(const ImageRoot& root, const ImageEntry& src, const std::string& src_shown,
-               int dst_dir, const std::string& dst_shown, unsigned flags,
-               const ServerDirGuard& guard, StringList& made) {
-    Walk w{root, flags, guard, true, &made, {}};
-    w.walked.insert({src.st.st_dev, src.st.st_ino});
-    return walk(w, src, src_shown, dst_dir, dst_shown);
-}
-
 int copy_tree(const ImageRoot& root, const ImageEntry& src, const std::string& src_shown,
               int dst_dir, const std::string& dst_shown, unsigned flags,
-              const ServerDirGuard& guard) {
-    Walk w{root, flags, guard, false, nullptr, {}};
+              const ServerDirGuard& guard, const TreePass& pass) {
+    Walk w{root, flags, guard, pass, {}};
     w.walked.insert({src.st.st_dev, src.st.st_ino});
     return walk(w, src, src_shown, dst_dir, dst_shown);
 }

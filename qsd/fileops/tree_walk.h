@@ -8,7 +8,9 @@
 #include <functional>
 #include <string>
 
+#include "qsd/fileops/copy_outcome.h"
 #include "qsd/fileops/image_tree.h"
+#include "qsd/text/plan.h"
 #include "qsd/text/text.h"
 
 namespace zr7 {
@@ -20,13 +22,29 @@ struct ServerDirGuard {
     bool active = false;
     dev_t device = 0;
     ino_t inode = 0;
-    // Backs VXAENV up before a copy replaces it; 0 or the failure's status.
+    // Backs VXAENV up before a copy replaces it (a preview tells the backup it
+    // would make); 0 or the failure's status.
     std::function<int()> back_up_env_file;
 };
 
 // The names in an open directory, "." and ".." left out, in the order the
 // directory yields them. 0 or errno.
 int list_names(int dir, StringList& names);
+
+// How a walk goes: copying, or changing nothing (the checks before a run,
+// and the preview).
+struct TreePass {
+    // Meets what the copy would meet and fails with the same line and status
+    // where it would, but creates no directory and copies no file.
+    bool check_only = false;
+    // For check_only: what the commands before would have made (a directory
+    // still to be made is walked with -1 for its descriptor); the walk adds
+    // what it would make.
+    PlannedTree* planned = nullptr;
+    // Told each action (mkdir, create, replace, same, keep) as it is taken,
+    // or, checking, as it would be.
+    ActionSink* sink = nullptr;
+};
 
 // Copies the tree below `src` into `dst_dir` (shown as `dst_shown`, ending
 // in "/"), creating sub-directories as it reaches them. Each image directory
@@ -36,16 +54,7 @@ int list_names(int dir, StringList& names);
 // directory that cannot be made, -9 a backup).
 int copy_tree(const ImageRoot& root, const ImageEntry& src, const std::string& src_shown,
               int dst_dir, const std::string& dst_shown, unsigned flags,
-              const ServerDirGuard& guard);
-
-// The same walk changing nothing: it meets what the copy would meet and fails
-// with the same line and status where the copy would, but creates no
-// directory and copies no file. `dst_dir` is -1 for a destination that the
-// copy would create; the directories it would create are added to `made`
-// (shown paths, without the final "/").
-int check_tree(const ImageRoot& root, const ImageEntry& src, const std::string& src_shown,
-               int dst_dir, const std::string& dst_shown, unsigned flags,
-               const ServerDirGuard& guard, StringList& made);
+              const ServerDirGuard& guard, const TreePass& pass = {});
 
 // Whether a copy of the open image file into `name` of `dst_dir` (-1: a
 // directory still to be made) would fail, without copying: a source that is

@@ -1,6 +1,6 @@
 #include "qsd/installer/simple_command.h"
 
-SimpleCommand::SimpleCommand(int kind_, const char* source_, const char* destination_,
+SimpleCommand::SimpleCommand(CommandKind kind_, const char* source_, const char* destination_,
                              const char* options_)
     : kind(kind_) {
     if (source_ != nullptr)
@@ -14,7 +14,7 @@ SimpleCommand::SimpleCommand(int kind_, const char* source_, const char* destina
 namespace {
 
 struct CommandRow {
-    int kind;
+    CommandKind kind;
     const char* source;
     const char* destination;
     const char* options;

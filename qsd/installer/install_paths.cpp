@@ -5,6 +5,7 @@
 #include <fcntl.h>
 #include <sys/stat.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <ctime>
 
@@ -92,13 +93,51 @@ zr7::ServerDirGuard Installer610::server_dir_guard() {
     guard.back_up_env_file = [this, path]() {
         struct stat env {};
         zr7::fs::UniqueFd dir;
-        if (open_in_home(path, dir) != 0 || zr7::fs::stat_at(dir.get(), "VXAENV", env) != 0)
+        if (open_in_home(path, dir) != 0)
+            return 0;
+        const bool exists = zr7::fs::stat_at(dir.get(), "VXAENV", env) == 0;
+        if (preview) {
+            if (exists || planned.file(path + "/VXAENV") != nullptr)
+                on_action(zr7::Action::kBackup, planned_env_backup(dir.get(), path), "");
+            return 0;
+        }
+        if (!exists)
             return 0;
         std::string made;
-        return zr7::backup_file(path.c_str(), "VXAENV", path.c_str(),
-                                zr7::backup_stamp(std::time(nullptr)), made);
+        const int status = zr7::backup_file(path.c_str(), "VXAENV", path.c_str(),
+                                            zr7::backup_stamp(std::time(nullptr)), made);
+        if (status == 0)
+            on_action(zr7::Action::kBackup, made, "");
+        return status;
     };
     return guard;
+}
+
+std::string Installer610::planned_env_backup(int dir, const std::string& dir_shown) {
+    const std::string path = zr7::planned_backup_path(
+        dir, dir_shown, "VXAENV", zr7::backup_stamp(std::time(nullptr)),
+        [this](const std::string& backup) { return planned.file(backup) != nullptr; });
+    planned.add_file(path, zr7::PlannedFile{});
+    return path;
+}
+
+int Installer610::read_planned(const zr7::PlannedFile& file, std::string& content) {
+    const std::size_t slash = file.source.find_last_of('/');
+    zr7::ImageEntry dir;
+    zr7::ImageEntry entry;
+    int error =
+        slash == std::string::npos ? ENOENT : open_in_image(file.source.substr(0, slash), dir);
+    if (error == 0) {
+        error = zr7::open_image_entry(image, dir.fd.get(), dir.where, dir.outside,
+                                      file.source.substr(slash + 1), entry);
+    }
+    if (error == 0 && entry.kind != zr7::EntryKind::kFile)
+        error = zr7::fs::kNotRegular;
+    if (error == 0)
+        error = zr7::fs::read_all(entry.fd.get(), content);
+    if (error == 0 && file.strip_cr)
+        content.erase(std::remove(content.begin(), content.end(), '\r'), content.end());
+    return error;
 }
 
 void Installer610::note_written(int dir) {

@@ -1,17 +1,23 @@
+#include <unistd.h>
+
+#include <climits>
 #include <cstdio>
+#include <memory>
+
 #include "qsd/config/names.h"
 
 #include "qsd/fileops/install_util.h"
 #include "qsd/installer/installer610.h"
 #include "qsd/platform/directory_lock.h"
 #include "qsd/platform/interruption.h"
-#include "qsd/platform/progress.h"
 #include "qsd/platform/trace.h"
 
 int Installer610::init(const std::string& src_dir, const std::string& home_dir) {
     ZR7_OPERATION("Installer610::init");
     source_path = src_dir;
     home_path = home_dir.empty() ? "./" : home_dir;
+    char cwd[PATH_MAX];
+    working_dir = ::getcwd(cwd, sizeof cwd) != nullptr ? cwd : "";
     (void)open_home();
     int status = read_config(home_path);
     // The server name and the architecture name directories under the home:
@@ -47,20 +53,25 @@ int Installer610::init(const std::string& src_dir, const std::string& home_dir) 
 int Installer610::go() {
     ZR7_OPERATION("Installer610::go");
     // Two installations into one server take turns: their copies would race
-    // for the same files, and each must see the other's VXAENV.
+    // for the same files, and each must see the other's VXAENV. A preview
+    // writes nothing and takes no lock.
     // The lock reports its own wait and why it gave up.
-    zr7::DirectoryLock run_lock(home_path);
-    if (run_lock.failure() == zr7::kStatusInterrupted)
-        ZR7_RETURN(interrupted());
-    if (run_lock.failure() != 0)
-        ZR7_RETURN(run_lock.failure());
+    std::unique_ptr<zr7::DirectoryLock> run_lock;
+    if (!preview) {
+        run_lock = std::make_unique<zr7::DirectoryLock>(home_path);
+        if (run_lock->failure() == zr7::kStatusInterrupted)
+            ZR7_RETURN(interrupted());
+        if (run_lock->failure() != 0)
+            ZR7_RETURN(run_lock->failure());
+    }
     if (copying == 0)
         ZR7_DETAIL("Copying disabled");
     if (seeding == 0)
         ZR7_DETAIL("Seeding disabled");
     CommandList commands = build_command_list(copying != 0, seeding != 0);
+    error_mark = error_lines.size();
     int status = check_commands(commands);
-    if (status == 0)
+    if (status == 0 && !preview)
         status = process_commands(commands);
     // What was installed is on the disk before the run reports it.
     sync_written();
@@ -75,8 +86,11 @@ int Installer610::process_commands(CommandList& commands) {
         if (zr7::interruption() != 0)
             ZR7_RETURN(interrupted());
         const SimpleCommand& command = commands[i];
-        zr7::progress_command(static_cast<int>(i + 1), static_cast<int>(commands.size()),
-                              command.kind, command.source);
+        error_mark = error_lines.size();
+        if (observer != nullptr) {
+            observer->on_command(static_cast<int>(i + 1), static_cast<int>(commands.size()),
+                                 command.kind, command.source);
+        }
         switch (command.kind) {
             case kFlatCopy:
                 status = copy(command.source, command.destination);
@@ -90,8 +104,6 @@ int Installer610::process_commands(CommandList& commands) {
             case kSeed:
                 status = seed(command.source, command.destination);
                 break;
-            default:
-                break;
         }
         // A signal that came during the command wins over the failure it
         // may have caused (the copy program it killed).
@@ -101,6 +113,31 @@ int Installer610::process_commands(CommandList& commands) {
             ZR7_RETURN(status);
     }
     ZR7_RETURN(0);
+}
+
+void Installer610::on_action(zr7::Action action, const std::string& path, const std::string& diff) {
+    std::string shown = path;
+    if (action != zr7::Action::kError && (shown.empty() || shown[0] != '/')) {
+        while (shown.compare(0, 2, "./") == 0)
+            shown.erase(0, 2);
+        shown = working_dir + (working_dir.empty() || working_dir.back() != '/' ? "/" : "") + shown;
+    }
+    plan.on_action(action, shown, diff);
+    if (observer != nullptr)
+        observer->on_action(action, shown, diff);
+}
+
+void Installer610::finish_plan(int status) {
+    if (status == 0 || plan.count(zr7::Action::kError) != 0)
+        return;
+    static const std::string kMark = "Error: ";
+    std::string text = "status " + std::to_string(status);
+    if (error_mark < error_lines.size()) {
+        text = error_lines[error_mark];
+        if (text.compare(0, kMark.size(), kMark) == 0)
+            text.erase(0, kMark.size());
+    }
+    on_action(zr7::Action::kError, text, "");
 }
 
 int Installer610::interrupted() {

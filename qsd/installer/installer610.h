@@ -5,13 +5,18 @@
 #include <utility>
 #include <vector>
 
+#include "qsd/fileops/copy_outcome.h"
 #include "qsd/fileops/image_tree.h"
 #include "qsd/fileops/tree_walk.h"
+#include "qsd/installer/run_observer.h"
 #include "qsd/installer/simple_command.h"
 #include "qsd/platform/fs.h"
 #include "qsd/text/dictionary.h"
+#include "qsd/text/plan.h"
 
-class Installer610 {
+// Every action of the run reaches the installer's on_action: it keeps the
+// plan (what the run did, or in a preview would do) and tells the observer.
+class Installer610 : public zr7::ActionSink {
   public:
     Installer610();
     virtual ~Installer610();
@@ -35,13 +40,18 @@ class Installer610 {
     int go();
     int process_commands(CommandList& commands);
     // Every command's checks, changing nothing (preflight.cpp): 0, or the
-    // line and status of the command that would fail.
+    // line and status of the command that would fail. In a preview the
+    // checks also tell every action the command would take.
     int check_commands(const CommandList& commands);
     int check_architecture();
-    int check_flat_copy(const SimpleCommand& command, const zr7::StringList& made);
-    int check_tree_copy(const SimpleCommand& command, zr7::StringList& made);
     int check_env_file(const SimpleCommand& command);
     int check_seed(const SimpleCommand& command);
+    // Takes an action of the run: into the plan, and to the observer. Paths
+    // are made absolute.
+    void on_action(zr7::Action action, const std::string& path, const std::string& diff) override;
+    // Ends the plan of a run that ends with `status`: a failure adds its
+    // "error" action, the first "Error:" line since the failing step began.
+    void finish_plan(int status);
     // The stop at a recorded signal N: "Error: Interrupted by signal <N>" in
     // the log and on standard error; returns 128+N, the run's status.
     int interrupted();
@@ -67,11 +77,20 @@ class Installer610 {
     void sync_written();
     // The server's table directory, for the tree copies.
     zr7::ServerDirGuard server_dir_guard();
+    // The backup of `dir_shown`/VXAENV that a preview plans, kept in the plan
+    // of the tree so that a second one takes the next name.
+    std::string planned_env_backup(int dir, const std::string& dir_shown);
 
-    // Flat and tree copies.
+    // Flat and tree copies; with `check_only`, the same steps changing nothing.
     int copy(const std::string& src_template, const std::string& dst_template);
     int recursive_copy(const std::string& src_template, const std::string& dst_template,
                        const std::string& options);
+    int flat_copy(const std::string& src_template, const std::string& dst_template,
+                  bool check_only);
+    int tree_copy(const std::string& src_template, const std::string& dst_template,
+                  const std::string& options, bool check_only);
+    // The bytes a preview's planned file would have (read from the image).
+    int read_planned(const zr7::PlannedFile& file, std::string& content);
 
     // Catalog seeding.
     int seed(const std::string& src_template, const std::string& dst_template);
@@ -99,4 +118,11 @@ class Installer610 {
     zr7::ImageRoot image;        // the image's MSRV, open once a command reads it
     int image_error = -1;        // -1 before the first open, then 0 or its error
     std::vector<std::pair<dev_t, zr7::fs::UniqueFd>> written;  // one directory per file system
+    bool preview = false;                                      // -n: tell the plan, change nothing
+    zr7::RunObserver* observer = nullptr;                      // the driver's, may be null
+    zr7::Plan plan;                                            // the actions so far
+    zr7::PlannedTree planned;     // checking: what the commands would have made
+    zr7::StringList error_lines;  // every "Error:" line of the run
+    std::size_t error_mark = 0;   // the first error line of the current step
+    std::string working_dir;      // makes the plan's paths absolute
 };

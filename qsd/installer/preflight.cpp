@@ -3,9 +3,7 @@
 // meet, and a failure found here ends the run with the line and the status
 // that the command would have ended it with. What cannot be foreseen (a full
 // disk, a race) still stops the run where it happens.
-#include <algorithm>
-
-#include "qsd/fileops/copy_options.h"
+#include "qsd/envfile/env_rewrite.h"
 #include "qsd/fileops/install_util.h"
 #include "qsd/installer/installer610.h"
 #include "qsd/platform/fs.h"
@@ -49,95 +47,6 @@ int Installer610::check_architecture() {
     return -7;
 }
 
-int Installer610::check_flat_copy(const SimpleCommand& command, const zr7::StringList& made) {
-    ZR7_TRACED("Installer610::copy");
-    std::string src;
-    std::string dst;
-    if (expand_src_dst(command.source, command.destination, src, dst) != 0)
-        return -1;
-    zr7::ImageEntry dir;
-    zr7::StringList names;
-    const int opened = open_in_image(src, dir);
-    if (opened == ENOENT || opened == ENOTDIR)
-        return 0;
-    if (opened == zr7::kLeadsOutside) {
-        ZR7_ERROR("Error: Link <%s> leads outside the image", src.c_str());
-        return -5;
-    }
-    if (opened != 0 || zr7::list_names(dir.fd.get(), names) != 0) {
-        ZR7_ERROR("Error: Can't open <%s>", src.c_str());
-        return -7;
-    }
-    zr7::fs::UniqueFd dst_dir;
-    int dst_error = -1;
-    for (const std::string& name : names) {
-        const std::string from = src + "/" + name;
-        const std::string to = dst + "/" + name;
-        zr7::ImageEntry entry;
-        const int found =
-            zr7::open_image_entry(image, dir.fd.get(), dir.where, dir.outside, name, entry);
-        if (found == ENOENT || (found == 0 && (entry.kind == zr7::EntryKind::kPassOver ||
-                                               entry.kind == zr7::EntryKind::kDirectory))) {
-            continue;
-        }
-        if (found == zr7::kLeadsOutside) {
-            ZR7_ERROR("Error: Link <%s> leads outside the image", from.c_str());
-            return -5;
-        }
-        if (found != 0) {
-            ZR7_ERROR("Error: Can't access <%s>", from.c_str());
-            return -7;
-        }
-        if (dst_error == -1) {
-            dst_error = open_in_home(dst, dst_dir);
-            // A directory that an earlier tree copy of this run will make.
-            if (dst_error == ENOENT && std::find(made.begin(), made.end(), dst) != made.end())
-                dst_error = 0;
-            if (dst_error != 0) {
-                ZR7_ERROR("Error: Can't open <%s>", dst.c_str());
-                ZR7_ERROR("Error: <%s>: %s", dst.c_str(), zr7::fs::error_text(dst_error).c_str());
-                return -5;
-            }
-        }
-        if (zr7::check_copy_at(entry.fd.get(), entry.st, from, dst_dir.get(), name, to) != 0) {
-            ZR7_ERROR("Error: Copy src <%s> to dst <%s> failed", from.c_str(), to.c_str());
-            return -5;
-        }
-    }
-    return 0;
-}
-
-int Installer610::check_tree_copy(const SimpleCommand& command, zr7::StringList& made) {
-    ZR7_TRACED("Installer610::recursive_copy");
-    std::string src;
-    std::string dst;
-    if (expand_src_dst(command.source, command.destination, src, dst) != 0)
-        return -1;
-    zr7::ImageEntry top;
-    const int opened = open_in_image(src, top);
-    if (opened == ENOENT)
-        return 0;
-    if (opened != 0) {
-        ZR7_ERROR(opened == zr7::kLeadsOutside ? "Error: Link <%s> leads outside the image"
-                                               : "Error: Can't open <%s>",
-                  src.c_str());
-        return -5;
-    }
-    zr7::StringList names;
-    if (zr7::list_names(top.fd.get(), names) == 0 && names.empty())
-        return 0;
-    zr7::fs::UniqueFd dst_dir;
-    if (const int error = open_in_home(dst, dst_dir)) {
-        ZR7_ERROR("Error: Can't open <%s>", dst.c_str());
-        ZR7_ERROR("Error: <%s>: %s", dst.c_str(), zr7::fs::error_text(error).c_str());
-        return -5;
-    }
-    const int status =
-        zr7::check_tree(image, top, src, dst_dir.get(), dst + "/",
-                        zr7::copy_flags_from_options(command.options), server_dir_guard(), made);
-    return status == 0 || status == -9 ? status : -5;
-}
-
 int Installer610::check_env_file(const SimpleCommand& command) {
     ZR7_TRACED("Installer610::update_vxaenv");
     std::string dir;
@@ -160,11 +69,31 @@ int Installer610::check_env_file(const SimpleCommand& command) {
     }
     if (error == 0)
         error = zr7::fs::open_read(target.dir.get(), target.name, file, st);
-    if (error == 0)
+    if (error != 0) {
+        ZR7_ERROR("Error: Can't open <%s>", env_path.c_str());
+        ZR7_ERROR("Error: <%s>: %s", env_path.c_str(), zr7::fs::error_text(error).c_str());
+        return -7;
+    }
+    if (!preview)
         return 0;
-    ZR7_ERROR("Error: Can't open <%s>", env_path.c_str());
-    ZR7_ERROR("Error: <%s>: %s", env_path.c_str(), zr7::fs::error_text(error).c_str());
-    return -7;
+    // The file as the copies before would leave it.
+    std::string content;
+    const zr7::PlannedFile* earlier = planned.file(env_path);
+    error = earlier != nullptr ? read_planned(*earlier, content)
+                               : zr7::fs::read_all(file.get(), content);
+    if (error != 0) {
+        ZR7_ERROR("Error: Can't open <%s>", env_path.c_str());
+        ZR7_ERROR("Error: <%s>: %s", env_path.c_str(), zr7::fs::error_text(error).c_str());
+        return -7;
+    }
+    zr7::Dictionary requested = settings;
+    const zr7::EnvRewrite rewrite = zr7::rewrite_env_content(content, requested, module_name);
+    if (!rewrite.changed)
+        return 0;
+    on_action(zr7::Action::kBackup, planned_env_backup(dir_fd.get(), dir), "");
+    on_action(zr7::Action::kVxaenv, env_path,
+              zr7::unified_diff(content, rewrite.content, "VXAENV"));
+    return 0;
 }
 
 int Installer610::check_seed(const SimpleCommand& command) {
@@ -178,14 +107,24 @@ int Installer610::check_seed(const SimpleCommand& command) {
         ZR7_ERROR("Error: Can't open <%s>", src.c_str());
         return -7;
     }
+    bool loader_found = false;
     for (const std::string& name : names) {
-        if (zr7::select_sql_name(name) != zr7::SqlSelection::kSeed)
-            continue;
-        if (!zr7::find_on_path("qdsload").empty())
-            return 0;
-        ZR7_ERROR("Error: Can't start <qdsload>: not found on PATH");
-        ZR7_ERROR("Error: Seeding <%s> failed", name.c_str());
-        return -6;
+        const bool seeded = zr7::select_sql_name(name) == zr7::SqlSelection::kSeed;
+        if (seeded && !loader_found) {
+            if (zr7::find_on_path("qdsload").empty()) {
+                ZR7_ERROR("Error: Can't start <qdsload>: not found on PATH");
+                ZR7_ERROR("Error: Seeding <%s> failed", name.c_str());
+                return -6;
+            }
+            loader_found = true;
+        }
+        if (seeded && name.find('\n') != std::string::npos) {
+            ZR7_ERROR("Error: Can't seed <%s>: the name holds a line break", name.c_str());
+            ZR7_ERROR("Error: Seeding <%s> failed", name.c_str());
+            return -6;
+        }
+        if (preview)
+            on_action(seeded ? zr7::Action::kSeed : zr7::Action::kPass, dst + "/" + name, "");
     }
     return 0;
 }
@@ -193,24 +132,21 @@ int Installer610::check_seed(const SimpleCommand& command) {
 int Installer610::check_commands(const CommandList& commands) {
     ZR7_OPERATION("Installer610::check_commands");
     int status = copying != 0 ? check_architecture() : 0;
-    zr7::StringList made;
     for (const SimpleCommand& command : commands) {
         if (status < 0)
             break;
         switch (command.kind) {
             case kFlatCopy:
-                status = check_flat_copy(command, made);
+                status = flat_copy(command.source, command.destination, true);
                 break;
             case kTreeCopy:
-                status = check_tree_copy(command, made);
+                status = tree_copy(command.source, command.destination, command.options, true);
                 break;
             case kUpdateEnv:
                 status = check_env_file(command);
                 break;
             case kSeed:
                 status = check_seed(command);
-                break;
-            default:
                 break;
         }
     }

@@ -13,12 +13,13 @@ enum CommandKind {
 
 class SimpleCommand {
   public:
-    SimpleCommand(int kind, const char* source, const char* destination, const char* options);
+    SimpleCommand(CommandKind kind, const char* source, const char* destination,
+                  const char* options);
     virtual ~SimpleCommand() = default;
     SimpleCommand(const SimpleCommand&) = default;
     SimpleCommand& operator=(const SimpleCommand&) = default;
 
-    int kind;
+    CommandKind kind;
     std::string source;
     std::string destination;
     std::string options;

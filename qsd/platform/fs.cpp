@@ -35,6 +35,8 @@ void UniqueFd::reset(int fd) {
 std::string error_text(int error) {
     if (error == kUntrustedLink)
         return "A symbolic link owned by another account";
+    if (error == kNotPrivate)
+        return "Not a private directory of the running account";
     if (error == kNotRegular)
         return "Not a regular file";
     return std::strerror(error);
@@ -326,8 +328,10 @@ int open_append(int dir, const std::string& name, UniqueFd& out) {
     return 0;
 }
 
-int make_dir(int dir, const std::string& name, UniqueFd& out) {
+int make_dir(int dir, const std::string& name, UniqueFd& out, bool* created) {
     const bool made = ::mkdirat(dir, name.c_str(), 0777) == 0;
+    if (created != nullptr)
+        *created = made;
     if (!made && errno != EEXIST)
         return errno;
     int links_left = kMaxLinks;
@@ -336,6 +340,23 @@ int make_dir(int dir, const std::string& name, UniqueFd& out) {
     if (made) {
         if (const int failed = give_owner_of_dir(out.get(), dir))
             return failed;
+    }
+    return 0;
+}
+
+int make_private_dir(int dir, const std::string& name, UniqueFd& out) {
+    if (::mkdirat(dir, name.c_str(), 0700) != 0 && errno != EEXIST)
+        return errno;
+    const int fd = ::openat(dir, name.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC);
+    if (fd < 0)
+        return errno == ELOOP ? kUntrustedLink : errno;
+    out.reset(fd);
+    struct stat st {};
+    if (::fstat(fd, &st) != 0)
+        return errno;
+    if (st.st_uid != ::geteuid() || (st.st_mode & 022) != 0) {
+        out.reset();
+        return kNotPrivate;
     }
     return 0;
 }

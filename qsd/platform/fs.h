@@ -46,6 +46,8 @@ class UniqueFd {
 // kind (a pipe, a device, a directory where a file belongs).
 constexpr int kUntrustedLink = 100001;
 constexpr int kNotRegular = 100002;
+// A directory that must be the running account's alone is not.
+constexpr int kNotPrivate = 100003;
 // The system's text for an error number, or ours for the two above.
 std::string error_text(int error);
 
@@ -93,8 +95,15 @@ int open_append(int dir, const std::string& name, UniqueFd& out);
 
 // Creates the directory `name` in `dir` (0777 less the umask; as root the
 // owner and group of `dir`) unless it is there, and opens it by the link
-// rule. 0 or an error number.
-int make_dir(int dir, const std::string& name, UniqueFd& out);
+// rule; `created` (when given) tells whether it was made here. 0 or an
+// error number.
+int make_dir(int dir, const std::string& name, UniqueFd& out, bool* created = nullptr);
+
+// Creates the directory `name` in `dir` (mode 0700, the running account's)
+// unless it is there, and opens it without following a link. An existing one
+// must belong to the running account and be writable by nobody else
+// (kNotPrivate): what root reads back from it decides what root writes.
+int make_private_dir(int dir, const std::string& name, UniqueFd& out);
 
 // Removes a file (never a directory). 0 or errno.
 int remove_file(int dir, const std::string& name);

@@ -134,6 +134,8 @@ long current_pid() {
 }
 
 bool g_echo_errors = false;
+bool g_quiet = false;
+std::vector<std::string>* g_error_lines = nullptr;
 
 // Whether a byte must be escaped in a line of the log.
 bool needs_escape(char c) {
@@ -183,6 +185,8 @@ void write_line(const TRC1_Unit* unit, int line, const char* message, std::size_
     out.append(number, digits > 0 ? static_cast<std::size_t>(digits) : 0);
     append_escaped(out, message, length);
     out += '\n';
+    if (g_quiet)
+        return;
     std::fwrite(out.data(), 1, out.size(), stdout);
     std::fflush(stdout);
 }
@@ -195,8 +199,11 @@ void write_line(const TRC1_Unit* unit, int line, const std::string& message) {
 // the first invocation's, so whoever started the tool sees why it failed.
 void echo_error(const char* message, std::size_t length) {
     static const char kMark[] = "Error:";
-    if (!g_echo_errors || length < sizeof kMark - 1 ||
-        std::string(message, sizeof kMark - 1) != kMark)
+    if (length < sizeof kMark - 1 || std::string(message, sizeof kMark - 1) != kMark)
+        return;
+    if (g_error_lines != nullptr)
+        g_error_lines->emplace_back(message, length);
+    if (!g_echo_errors)
         return;
     std::string out;
     append_escaped(out, message, length);
@@ -286,6 +293,14 @@ void trace_text(TRC1_Unit* unit, int line, bool error, const std::string& messag
 
 void trace_echo_errors(bool on) {
     g_echo_errors = on;
+}
+
+void trace_quiet(bool on) {
+    g_quiet = on;
+}
+
+void trace_collect_errors(std::vector<std::string>* lines) {
+    g_error_lines = lines;
 }
 
 }  // namespace zr7

@@ -19,6 +19,7 @@
 #pragma once
 
 #include <string>
+#include <vector>
 
 constexpr unsigned TRC1_FLOW = 0x40;
 constexpr unsigned TRC1_DETAIL = 0x10;
@@ -69,6 +70,14 @@ void trace_text(TRC1_Unit* unit, int line, bool error, const std::string& messag
 // The installing run turns this on: its standard error is the first
 // invocation's, where the administrator or a script looks for failures.
 void trace_echo_errors(bool on);
+
+// A preview prints its plan on standard output: no trace line goes there
+// (errors are still echoed and collected).
+void trace_quiet(bool on);
+
+// Every error line that begins with "Error:" is also appended, unescaped, to
+// `lines` until this is called with null: the run's record lists them.
+void trace_collect_errors(std::vector<std::string>* lines);
 
 // The program-wide sync counter; starts at 1, so a fresh record (0) syncs.
 extern unsigned g_trace_sync;

@@ -6,7 +6,6 @@
 #include "qsd/installer/installer610.h"
 #include "qsd/platform/fs.h"
 #include "qsd/platform/process.h"
-#include "qsd/platform/progress.h"
 #include "qsd/platform/trace.h"
 #include "qsd/seeding/seed_texts.h"
 #include "qsd/seeding/sql_selection.h"
@@ -41,9 +40,11 @@ int Installer610::seed_single_file(const std::string& dst_dir, const std::string
     switch (zr7::select_sql_name(file_name)) {
         case zr7::SqlSelection::kDeletion:
             ZR7_DETAIL("rejecting all _del.sql for now <%s> ", file_name.c_str());
+            on_action(zr7::Action::kPass, dst_dir + "/" + file_name, "");
             ZR7_RETURN(0);
         case zr7::SqlSelection::kNotSql:
             ZR7_DETAIL("rejecting non-sql file <%s> ", file_name.c_str());
+            on_action(zr7::Action::kPass, dst_dir + "/" + file_name, "");
             ZR7_RETURN(0);
         case zr7::SqlSelection::kSeed:
             break;
@@ -100,11 +101,13 @@ int Installer610::seed_single_file(const std::string& dst_dir, const std::string
         PLT1_PutEnv(sqllib.c_str());
         PLT1_PutEnv("VXA_TRC1=ERROR");
         ZR7_DETAIL("issuing cmd <%s> ", command.c_str());
-        zr7::progress_seeding(file_name);
+        if (observer != nullptr)
+            observer->on_seeding(file_name);
         (void)::lseek(response.fd(), 0, SEEK_SET);
         status = run_loader(response.fd(), log_fd.get());
-        if (status == 0)
-            zr7::progress_seeded(file_name);
+        // Given to the loader, whatever it made of it: the catalog may hold
+        // part of it.
+        on_action(zr7::Action::kSeed, dst_dir + "/" + file_name, "");
     }
     // Whatever happened, the response file does not outlive the run.
     if (placed)

@@ -8,6 +8,7 @@
 
 #include "qsd/driver/driver.h"
 #include "qsd/driver/getopt.h"
+#include "qsd/driver/progress.h"
 
 namespace {
 
@@ -111,21 +112,6 @@ TEST(CheckCommandLine, RunHelpVersionOrRefusalWithItsReason) {
 }
 
 // The fourteen lines of old stay first and whole; added options follow.
-TEST(UsageText, FourteenLinesThenTheAddedOptions) {
-    const std::string text = zr7::usage_text();
-    EXPECT_EQ(text.substr(0, 84),
-              "Usage: zr7inst [-c key=val] [-e] [-f] [-h home] [-m mod] [-s] "
-              "[-v ver] [-V] src_dir\n");
-    std::vector<std::string> lines;
-    for (std::size_t at = 0, end; (end = text.find('\n', at)) != std::string::npos; at = end + 1)
-        lines.push_back(text.substr(at, end - at));
-    ASSERT_EQ(lines.size(), 16u);
-    EXPECT_EQ(lines[13], "           only option, exit right away.");
-    EXPECT_EQ(lines[14].rfind("  --help   ", 0), 0u);
-    EXPECT_EQ(lines[15].rfind("  --version ", 0), 0u);
-    EXPECT_EQ(text.back(), '\n');
-}
-
 // The log's first and last lines of a run.
 TEST(RunRecord, HeaderAndClosingLines) {
     Argv argv({"/bin/zr7inst", "-o", "/s/logs/", "-m", "a b", "/img"});
@@ -171,6 +157,27 @@ TEST(RelaunchCommandText, LogOptionFirstAndAppendToTheLogLast) {
         Argv argv(args);
         EXPECT_EQ(zr7::relaunch_command_text(argv.argc(), argv.pointers.data(), home), text);
     }
+}
+
+zr7::ProgressState at(const char* name) {
+    return {17,   17,   4,    "${SRCPATH}/SQLLIB",    40,       1,
+            name, true, true, "/t/\033[31m/VXAENV_1", "mkdir 1"};
+}
+
+// Bytes a terminal obeys show as "?"; the line ends before the last column
+// ("é" is two bytes, one column).
+TEST(Progress, LineAndSummaryTexts) {
+    const std::string line = "[17/17] seed SQLLIB | files: 40 copied, 1 seeded | seeding ";
+    EXPECT_EQ(zr7::progress_line(at("a\033]0;\x9b\xc2\x9b\xff.sql"), 99), line + "a?]0;????.sql");
+    EXPECT_EQ(zr7::progress_line(at("éééé.sql"), 65), line + "éé...");
+    EXPECT_EQ(zr7::progress_summary(at(""), -5, "/s/logs\033/qsdinst.log", 2.5),
+              "zr7inst: installation failed with rc <-5> at [17/17] seed SQLLIB\n"
+              "  files copied: 40\n  files seeded: 1\n  VXAENV: changed, backup "
+              "/t/?[31m/VXAENV_1\n  actions: mkdir 1\n"
+              "  log: /s/logs?/qsdinst.log\n  elapsed: 2.500 s\n");
+    EXPECT_EQ(zr7::progress_summary({}, 0, "./qsdinst.log", 0.0004),
+              "zr7inst: installation done\n  files copied: 0\n  files seeded: 0\n"
+              "  VXAENV: not updated\n  log: ./qsdinst.log\n  elapsed: 0.000 s\n");
 }
 
 }  // namespace

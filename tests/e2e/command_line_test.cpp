@@ -25,6 +25,8 @@ const char* const kUsage =
     "           610 is supported.  Default is 610.\n"
     "  -V       Print out version as vvrrmmff.  If this is the\n"
     "           only option, exit right away.\n"
+    "  -n       Preview: print each change the installation would make,\n"
+    "           and change nothing.\n"
     "  --help   Print this text on standard output and exit.\n"
     "  --version Print the version line on standard output and exit.\n";
 

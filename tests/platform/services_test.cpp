@@ -7,7 +7,6 @@
 #include <tuple>
 
 #include "qsd/platform/process.h"
-#include "qsd/platform/progress.h"
 #include "qsd/platform/trace.h"
 #include "support/test_support.h"
 
@@ -108,25 +107,6 @@ TEST(PutEnv, KeepsItsOwnCopyOfTheEntry) {
     ASSERT_EQ(PLT1_PutEnv(entry), 0);
     std::strcpy(entry, "ZR7_PUTENV_TEST=XXXXX");
     EXPECT_STREQ(PLT1_GetEnv("ZR7_PUTENV_TEST", nullptr), "first");
-}
-
-zr7::ProgressState at(const char* name) {
-    return {17, 17, 4, "${SRCPATH}/SQLLIB", 40, 1, name, true, true, "/t/\033[31m/VXAENV_1"};
-}
-
-// Bytes a terminal obeys show as "?"; the line ends before the last column
-// ("é" is two bytes, one column).
-TEST(Progress, LineAndSummaryTexts) {
-    const std::string line = "[17/17] seed SQLLIB | files: 40 copied, 1 seeded | seeding ";
-    EXPECT_EQ(zr7::progress_line(at("a\033]0;\x9b\xc2\x9b\xff.sql"), 99), line + "a?]0;????.sql");
-    EXPECT_EQ(zr7::progress_line(at("éééé.sql"), 65), line + "éé...");
-    EXPECT_EQ(zr7::progress_summary(at(""), -5, "/s/logs\033/qsdinst.log", 2.5),
-              "zr7inst: installation failed with rc <-5> at [17/17] seed SQLLIB\n"
-              "  files copied: 40\n  files seeded: 1\n  VXAENV: changed, backup /t/?[31m/VXAENV_1\n"
-              "  log: /s/logs?/qsdinst.log\n  elapsed: 2.500 s\n");
-    EXPECT_EQ(zr7::progress_summary({}, 0, "./qsdinst.log", 0.0004),
-              "zr7inst: installation done\n  files copied: 0\n  files seeded: 0\n"
-              "  VXAENV: not updated\n  log: ./qsdinst.log\n  elapsed: 0.000 s\n");
 }
 
 }  // namespace

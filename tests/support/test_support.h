@@ -16,6 +16,11 @@ std::string read_file(const std::string& path);
 bool exists(const std::string& path);  // a link counts, wherever it points
 void remove_tree(const std::string& path);
 std::vector<std::string> list_dir(const std::string& path);  // sorted, no "." or ".."
+// A path of the records every run leaves: the log, qsdinst.json, the run store.
+inline bool is_run_record(const std::string& path) {
+    return path.find("/.zr7inst") != std::string::npos ||
+           path.find("/logs/qsdinst.") != std::string::npos;
+}
 
 // A fresh scratch directory, removed with its contents when the object goes away;
 // under `parent` when one is given, else under the system's scratch directory.

@@ -1,4 +1,4 @@
-#include "qsd/platform/progress.h"
+#include "qsd/driver/progress.h"
 
 #include <sys/ioctl.h>
 #include <unistd.h>
@@ -10,18 +10,6 @@
 namespace zr7 {
 
 namespace {
-
-struct Display {
-    bool on = false;
-    ProgressState run;
-    std::string drawn;  // the line on the terminal now
-    std::size_t drawn_width = 0;
-};
-
-Display& display() {
-    static Display instance;
-    return instance;
-}
 
 // A command's source without its leading symbol directories:
 // "${SRCPATH}/${BINARCH}/TABLE/TECLIB" shows as "TABLE/TECLIB".
@@ -111,21 +99,6 @@ std::size_t terminal_width() {
     return 80;
 }
 
-void redraw() {
-    Display& d = display();
-    const std::string line = progress_line(d.run, terminal_width());
-    if (line == d.drawn)
-        return;
-    const std::size_t width = display_width(line);
-    std::string text = "\r" + line;
-    if (width < d.drawn_width)
-        text.append(d.drawn_width - width, ' ');
-    std::fputs(text.c_str(), stderr);
-    std::fflush(stderr);
-    d.drawn = line;
-    d.drawn_width = width;
-}
-
 }  // namespace
 
 std::string terminal_safe(const std::string& text) {
@@ -197,77 +170,89 @@ std::string progress_summary(const ProgressState& state, int status, const std::
     } else {
         text += "  VXAENV: changed, backup " + terminal_safe(state.backup) + "\n";
     }
+    if (!state.counts.empty())
+        text += "  actions: " + state.counts + "\n";
     text += "  log: " + terminal_safe(log_file) + "\n";
     text += "  elapsed: " + elapsed_text(elapsed_seconds) + " s\n";
     return text;
 }
 
-void progress_enable(bool on) {
-    display().on = on;
-}
-bool progress_enabled() {
-    return display().on;
-}
 bool progress_wanted(bool stderr_is_terminal, bool stdout_is_terminal) {
     return stderr_is_terminal && !stdout_is_terminal;
 }
 
-void progress_command(int index, int count, int kind, const std::string& source_template) {
-    ProgressState& run = display().run;
-    run.command = index;
-    run.commands = count;
-    run.kind = kind;
-    run.source_template = source_template;
-    run.seeding.clear();
-    if (display().on)
-        redraw();
+void ProgressDisplay::redraw() {
+    if (!shown_)
+        return;
+    const std::string line = progress_line(run_, terminal_width());
+    if (line == drawn_)
+        return;
+    const std::size_t width = display_width(line);
+    std::string text = "\r" + line;
+    if (width < drawn_width_)
+        text.append(drawn_width_ - width, ' ');
+    std::fputs(text.c_str(), stderr);
+    std::fflush(stderr);
+    drawn_ = line;
+    drawn_width_ = width;
+}
+
+void ProgressDisplay::on_command(int index, int count, CommandKind kind,
+                                 const std::string& source_template) {
+    run_.command = index;
+    run_.commands = count;
+    run_.kind = kind;
+    run_.source_template = source_template;
+    run_.seeding.clear();
+    redraw();
 }
 
 // A copy spawns a program; writing one short line to the terminal costs far
 // less, so the count is shown for every file.
-void progress_file_copied(const std::string& /*destination*/) {
-    ++display().run.files_copied;
-    if (display().on)
-        redraw();
+void ProgressDisplay::on_action(Action action, const std::string& path,
+                                const std::string& /*diff*/) {
+    switch (action) {
+        case Action::kCreate:
+        case Action::kReplace:
+        case Action::kSame:
+            ++run_.files_copied;
+            break;
+        case Action::kSeed:
+            ++run_.files_seeded;
+            break;
+        case Action::kBackup:
+            run_.backup = path;
+            break;
+        default:
+            break;
+    }
+    run_.seeding.clear();
+    redraw();
 }
 
-void progress_seeding(const std::string& file_name) {
-    display().run.seeding = file_name;
-    if (display().on)
-        redraw();
+void ProgressDisplay::on_seeding(const std::string& file_name) {
+    run_.seeding = file_name;
+    redraw();
 }
 
-void progress_seeded(const std::string& /*file_name*/) {
-    ProgressState& run = display().run;
-    ++run.files_seeded;
-    run.seeding.clear();
-    if (display().on)
-        redraw();
+void ProgressDisplay::on_env_result(bool changed) {
+    run_.env_reported = true;
+    run_.env_changed = changed;
 }
 
-void progress_env_result(bool changed, const std::string& backup_path) {
-    ProgressState& run = display().run;
-    run.env_reported = true;
-    run.env_changed = changed;
-    run.backup = backup_path;
-}
-
-const ProgressState& progress_state() {
-    return display().run;
-}
-
-void progress_finish(int status, const std::string& log_file, double elapsed_seconds) {
-    Display& d = display();
-    if (!d.on)
+void ProgressDisplay::finish(int status, const std::string& counts, const std::string& log_file,
+                             double elapsed_seconds) {
+    run_.counts = counts;
+    if (!shown_)
         return;
     std::string text;
-    if (d.drawn_width > 0)
-        text = "\r" + std::string(d.drawn_width, ' ') + "\r";
-    text += progress_summary(d.run, status, log_file, elapsed_seconds);
+    if (drawn_width_ > 0)
+        text = "\r" + std::string(drawn_width_, ' ') + "\r";
+    text += progress_summary(run_, status, log_file, elapsed_seconds);
     std::fputs(text.c_str(), stderr);
     std::fflush(stderr);
-    d.drawn.clear();
-    d.drawn_width = 0;
+    drawn_.clear();
+    drawn_width_ = 0;
 }
 
 }  // namespace zr7
