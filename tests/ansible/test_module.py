@@ -185,7 +185,9 @@ class Messages(unittest.TestCase):
                   "zr7inst: installation failed with exit status 2; see /h/logs/qsdinst.log\n")
         self.assertEqual(m.error_lines(stderr), ["Error: Can't open kmsenv", "Error: /h/k: No such file or directory"])
         self.assertEqual(m.log_path(stderr, "/other"), "/h/logs/qsdinst.log")
-        self.assertEqual(m.log_path("", "/h"), "/h/logs/qsdinst.log")
+        self.assertEqual(m.log_path("", "/h", exists=lambda path: True), "/h/logs/qsdinst.log")
+        self.assertIsNone(m.log_path("Error: Installation directory </h> does not exist\n", "/h",
+                                     exists=lambda path: False))
 
     def test_reason(self):
         self.assertEqual(m.reason(["Error: a", "Error: b"], "x\n"), "Error: a; Error: b")

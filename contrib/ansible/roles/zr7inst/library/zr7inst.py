@@ -156,7 +156,7 @@ errors:
   elements: str
   sample: ["Error: Can't open kmsenv", "Error: /opt/marlin/config/.ConfigData/kmsenv: No such file or directory"]
 log:
-  description: The path of the installation's log.
+  description: The path of the installation's log (null when the tool refused to start one).
   returned: after a real run
   type: str
   sample: /opt/marlin/logs/qsdinst.log
@@ -323,13 +323,15 @@ def reason(errors, stderr):
     return lines[0] if lines else "no message"
 
 
-def log_path(stderr, home):
-    """The log the tool named on failure, else the one a run in home writes."""
+def log_path(stderr, home, exists=os.path.exists):
+    """The log the tool named on failure, else the one a run in home writes
+    when there is one (a run refused before it started writes none)."""
     for line in reversed(stderr.splitlines()):
         match = FAILED_LINE.search(line)
         if match:
             return match.group(1)
-    return os.path.join(home, "logs", LOG_NAME)
+    default = os.path.join(home, "logs", LOG_NAME)
+    return default if exists(default) else None
 
 
 def appended_records(data):
@@ -475,11 +477,10 @@ def run(module, tool, record_file):
     if undo and rc != 0 and NOTHING_TO_UNDO in errors:
         module.exit_json(changed=changed, msg="Nothing to undo", **result)
     if rc != 0:
-        module.fail_json(
-            changed=changed,
-            msg="zr7inst failed with exit status %d: %s; see %s" % (rc, reason(errors, stderr), result["log"]),
-            **result
-        )
+        msg = "zr7inst failed with exit status %d: %s" % (rc, reason(errors, stderr))
+        if result["log"]:
+            msg += "; see %s" % result["log"]
+        module.fail_json(changed=changed, msg=msg, **result)
     module.exit_json(changed=changed, **result)
 
 
