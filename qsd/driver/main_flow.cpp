@@ -206,9 +206,12 @@ int run_main(int argc, char** argv) {
     }
     installer.finish_plan(status);
     record.end = iso_local_time(static_cast<long>(std::time(nullptr)));
-    record.home =
-        installer.working_dir.empty() || home[0] == '/' ? home : installer.working_dir + "/" + home;
-    record.image = argv[options.index];
+    const auto absolute = [&installer](const std::string& path) {
+        return installer.working_dir.empty() || path[0] == '/' ? path
+                                                               : installer.working_dir + "/" + path;
+    };
+    record.home = absolute(home);
+    record.image = absolute(argv[options.index]);
     record.backup = progress.state().backup;
     status = keep_run_record(installer, record, status);
     trace_collect_errors(nullptr);

@@ -71,6 +71,10 @@ int Installer610::go() {
     CommandList commands = build_command_list(copying != 0, seeding != 0);
     error_mark = error_lines.size();
     int status = check_commands(commands);
+    // A failure the checks find comes before every change: the plan of such
+    // a run is its error alone.
+    if (status != 0 && preview)
+        plan = zr7::Plan();
     if (status == 0 && !preview)
         status = process_commands(commands);
     // What was installed is on the disk before the run reports it.
