@@ -10,7 +10,10 @@ namespace zr7 {
 CommandLineCheck check_command_line(int argc, char* const* argv) {
     CommandLineCheck check;
     GetOpt options(argc, argv, kOptionString);
+    bool undo = false;
     for (char letter = options.next(); letter != 0; letter = options.next()) {
+        if (letter == 'u')
+            undo = true;
         if (letter == '?') {
             check.action = CommandLineAction::kRefuse;
             check.fault = options.fault;
@@ -29,6 +32,13 @@ CommandLineCheck check_command_line(int argc, char* const* argv) {
         return check;
     }
     const int operands = argc - options.index;
+    if (undo) {
+        if (operands != 0) {
+            check.action = CommandLineAction::kRefuse;
+            check.fault = "-u takes no src_dir, " + std::to_string(operands) + " given";
+        }
+        return check;
+    }
     if (operands != 1) {
         check.action = CommandLineAction::kRefuse;
         check.fault = "one src_dir expected, " + std::to_string(operands) + " given";

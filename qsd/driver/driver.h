@@ -11,7 +11,7 @@
 namespace zr7 {
 
 constexpr const char* kVrmf = "06100400";
-constexpr const char* kOptionString = "c:efh:m:no:sv:V";
+constexpr const char* kOptionString = "c:efh:m:no:suv:V";
 
 // What main does; returns the process status.
 int run_main(int argc, char** argv);
@@ -90,7 +90,8 @@ std::string image_msrv_path(const std::string& src_dir);
 // The first invocation's checks before the relaunch: the installation
 // directory, the image's MSRV directory and the log directory exist. 0, or
 // -7 / -8 after a line on standard error.
-// `reason` (when given) receives the line, unescaped.
+// An empty `src_dir` (an undo) is not checked. `reason` (when given)
+// receives the line, unescaped.
 int check_before_relaunch(const std::string& home, const std::string& src_dir,
                           std::string* reason = nullptr);
 
@@ -103,7 +104,9 @@ namespace zr7 {
 // The preview (-n): the installing run's checks and plan in this process,
 // nothing changed, no log; the plan on standard output. Returns the status
 // the run would end with.
-int run_preview(Installer610& installer, const std::string& home, const std::string& src_dir);
+// With `undo`, the undo's plan; `src_dir` is unused then.
+int run_preview(Installer610& installer, const std::string& home, const std::string& src_dir,
+                bool undo);
 
 // Keeps the record of an installing run that ended with `status`: its
 // manifest in the installation's run store, and one line in

@@ -35,7 +35,7 @@ int check_before_relaunch(const std::string& home, const std::string& src_dir,
     if (!is_directory(home)) {
         line = "Error: Installation directory <" + home + "> does not exist";
         status = -7;
-    } else if (!is_directory(msrv)) {
+    } else if (!src_dir.empty() && !is_directory(msrv)) {
         line = "Error: Can't open <" + msrv + ">";
         status = -7;
     } else if (!is_directory(logs)) {

@@ -64,9 +64,9 @@ int run_main(int argc, char** argv) {
     const auto started = std::chrono::steady_clock::now();
     Installer610 installer;
     std::string home;
-    std::string source;
     int relaunched = 0;
     bool preview = false;      // -n
+    bool undo = false;         // -u
     bool env_options = false;  // -c or -m given
     GetOpt options(argc, argv, kOptionString);
 
@@ -124,6 +124,9 @@ int run_main(int argc, char** argv) {
             case 'n':
                 preview = true;
                 break;
+            case 'u':
+                undo = true;
+                break;
             case 'o':
                 installer.log_dir = options.argument;
                 relaunched = 1;
@@ -152,11 +155,13 @@ int run_main(int argc, char** argv) {
     if (home.back() != '/')
         home += '/';
 
+    // An undo has no src_dir.
+    const std::string src_dir = undo ? "" : argv[options.index];
     if (preview)
-        ZR7_RETURN(run_preview(installer, home, argv[options.index]));
+        ZR7_RETURN(run_preview(installer, home, src_dir, undo));
 
     if (relaunched == 0) {
-        int status = check_before_relaunch(home, argv[options.index]);
+        int status = check_before_relaunch(home, src_dir);
         if (status == 0)
             status = jump_start(argc, argv, home.c_str());
         ZR7_RETURN(status);
@@ -196,13 +201,18 @@ int run_main(int argc, char** argv) {
         ZR7_DETAIL("%s", kSkipped);
     }
 
-    source = image_source_path(argv[options.index]);
-
-    int status = installer.init(source, home);
-    if (status == 0) {
-        std::printf("Calling go\n");
-        std::fflush(stdout);
-        status = installer.go();
+    int status = 0;
+    if (undo) {
+        record.operation = "undo";
+        installer.init_home(home);
+        status = installer.undo();
+    } else {
+        status = installer.init(image_source_path(src_dir), home);
+        if (status == 0) {
+            std::printf("Calling go\n");
+            std::fflush(stdout);
+            status = installer.go();
+        }
     }
     installer.finish_plan(status);
     record.end = iso_local_time(static_cast<long>(std::time(nullptr)));
@@ -211,7 +221,7 @@ int run_main(int argc, char** argv) {
                                                                : installer.working_dir + "/" + path;
     };
     record.home = absolute(home);
-    record.image = absolute(argv[options.index]);
+    record.image = undo ? "" : absolute(src_dir);
     record.backup = progress.state().backup;
     status = keep_run_record(installer, record, status);
     trace_collect_errors(nullptr);

@@ -16,15 +16,19 @@ std::string image_source_path(const std::string& src_dir) {
     return source + "MSRV/";
 }
 
-int run_preview(Installer610& installer, const std::string& home, const std::string& src_dir) {
+int run_preview(Installer610& installer, const std::string& home, const std::string& src_dir,
+                bool undo) {
     trace_quiet(true);
     trace_echo_errors(true);
     trace_collect_errors(&installer.error_lines);
     installer.preview = true;
     std::string reason;
-    int status = check_before_relaunch(home, src_dir, &reason);
+    int status = check_before_relaunch(home, undo ? "" : src_dir, &reason);
     if (status != 0) {
         installer.error_lines.push_back(reason);
+    } else if (undo) {
+        installer.init_home(home);
+        status = installer.undo();
     } else {
         status = installer.init(image_source_path(src_dir), home);
         if (status == 0)

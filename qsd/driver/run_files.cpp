@@ -32,17 +32,17 @@ std::string absolute(const Installer610& installer, std::string path) {
 
 int keep_run_record(Installer610& installer, RunRecord& record, int status) {
     const std::string store_path = absolute(installer, installer.home_path + kRunStoreName);
-    int error = installer.home_fd.valid() ? 0 : EBADF;
-    fs::UniqueFd store;
-    fs::UniqueFd run;
-    if (error == 0)
-        error = open_run_store(installer.home_fd.get(), store);
-    if (error == 0)
-        error = create_run_dir(store.get(), record.run, run);
+    // A run that failed before it began its run directory begins one here.
+    int error = 0;
+    if (!installer.run_dir.valid())
+        error = installer.home_fd.valid() ? installer.begin_run_dir(false) : EBADF;
+    record.run = installer.run_id;
     const std::string manifest = store_path + "/" + record.run + "/manifest";
     const std::string failed = error == 0 ? manifest : store_path;
+    if (error == -8)
+        error = EIO;  // begin_run_dir wrote why
     if (error == 0) {
-        error = write_run_file(run.get(), "manifest",
+        error = write_run_file(installer.run_dir.get(), "manifest",
                                installer.plan.text() + installer.plan.summary() + "\n");
     }
     if (error != 0) {

@@ -29,6 +29,7 @@ const char* const kUsageLines =
 const char* const kAddedOptionLines[] = {
     "  -n       Preview: print each change the installation would make,\n"
     "           and change nothing.\n",
+    "  -u       Undo the newest installation not yet undone (no src_dir).\n",
     "  --help   Print this text on standard output and exit.\n",
     "  --version Print the version line on standard output and exit.\n",
 };

@@ -140,6 +140,13 @@ int Installer610::update_vxaenv(const std::string& dir_template) {
                                       zr7::backup_stamp(std::time(nullptr)), backup) != 0) {
         ZR7_ERROR("Error: Can't backup VXAENV");
         status = -9;
+    } else if (journal_or_null() != nullptr &&
+               ((error = journal->note("backup", backup)) != 0 ||
+                (error = journal->before_write(target.dir.get(), target.name, env_path,
+                                               zr7::Action::kReplace)) != 0)) {
+        ZR7_ERROR("Error: Can't keep the old version of <%s>", env_path.c_str());
+        ZR7_ERROR("Error: <%s>: %s", env_path.c_str(), zr7::fs::error_text(error).c_str());
+        status = -9;
     } else {
         on_action(zr7::Action::kBackup, backup, "");
         if ((error = replace.commit()) != 0) {
@@ -147,6 +154,8 @@ int Installer610::update_vxaenv(const std::string& dir_template) {
             ZR7_ERROR("Error: <%s>: %s", env_path.c_str(), zr7::fs::error_text(error).c_str());
             status = -5;
         } else {
+            if (journal_or_null() != nullptr)
+                (void)journal->after_write(target.dir.get(), target.name, env_path);
             on_action(zr7::Action::kVxaenv, env_path,
                       zr7::unified_diff(content, new_content, "VXAENV"));
         }

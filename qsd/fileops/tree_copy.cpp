@@ -93,8 +93,8 @@ int Installer610::flat_copy(const std::string& src_template, const std::string& 
                                                 &planned, digest);
         const int status =
             check_only ? zr7::check_copy_at(entry.fd.get(), entry.st, from, dst_dir.get(), name, to)
-                       : zr7::copy_file_at(entry.fd.get(), entry.st, from, dst_dir.get(), name, to,
-                                           kCopyOverwrite | kCopyFixCr);
+                       : zr7::journaled_copy(journal_or_null(), action, entry, from, dst_dir.get(),
+                                             name, to, kCopyOverwrite | kCopyFixCr);
         if (status != 0) {
             ZR7_ERROR("Error: Copy src <%s> to dst <%s> failed", from.c_str(), to.c_str());
             return status;
@@ -151,6 +151,7 @@ int Installer610::tree_copy(const std::string& src_template, const std::string& 
     pass.check_only = check_only;
     pass.planned = &planned;
     pass.sink = check_only && !preview ? nullptr : this;
+    pass.journal = check_only ? nullptr : journal_or_null();
     const int status =
         zr7::copy_tree(image, top, src, dst_dir.get(), dst + "/",
                        zr7::copy_flags_from_options(options), server_dir_guard(), pass);

@@ -37,6 +37,26 @@ int list_names(int dir, StringList& names) {
     return 0;
 }
 
+int journaled_copy(ChangeJournal* journal, Action action, const ImageEntry& entry,
+                   const std::string& src_shown, int dst_dir, const std::string& name,
+                   const std::string& dst_shown, unsigned flags) {
+    ZR7_TRACED("InstallUtil::copy_file");
+    const bool changes =
+        journal != nullptr && (action == Action::kCreate || action == Action::kReplace);
+    if (changes) {
+        if (const int error = journal->before_write(dst_dir, name, dst_shown, action)) {
+            ZR7_ERROR("Error: Can't keep the old version of <%s>", dst_shown.c_str());
+            ZR7_ERROR("Error: <%s>: %s", dst_shown.c_str(), fs::error_text(error).c_str());
+            return -5;
+        }
+    }
+    const int status =
+        copy_file_at(entry.fd.get(), entry.st, src_shown, dst_dir, name, dst_shown, flags);
+    if (status == 0 && changes)
+        (void)journal->after_write(dst_dir, name, dst_shown);
+    return status;
+}
+
 namespace {
 
 struct Walk {
@@ -113,8 +133,12 @@ int walk(Walk& w, const ImageEntry& src, const std::string& src_shown, int dst_d
                     tell(w, Action::kMkdir, dst_path);
                 }
             } else {
+                struct stat there {};
                 bool created = false;
-                error = fs::make_dir(dst_dir, name, sub, &created);
+                if (w.pass.journal != nullptr && fs::stat_at(dst_dir, name, there) != 0)
+                    error = w.pass.journal->before_mkdir(dst_path);
+                if (error == 0)
+                    error = fs::make_dir(dst_dir, name, sub, &created);
                 if (error == 0 && created)
                     tell(w, Action::kMkdir, dst_path);
             }
@@ -144,8 +168,8 @@ int walk(Walk& w, const ImageEntry& src, const std::string& src_shown, int dst_d
                                                  dst_path, w.pass.planned, digest);
         const int status =
             check_only ? check_copy_at(entry.fd.get(), entry.st, src_path, dst_dir, name, dst_path)
-                       : copy_file_at(entry.fd.get(), entry.st, src_path, dst_dir, name, dst_path,
-                                      w.flags);
+                       : journaled_copy(w.pass.journal, action, entry, src_path, dst_dir, name,
+                                        dst_path, w.flags);
         if (status != 0) {
             ZR7_ERROR("Error: Copy src <%s> to dst <%s> failed", src_path.c_str(),
                       dst_path.c_str());

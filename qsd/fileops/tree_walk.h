@@ -8,6 +8,7 @@
 #include <functional>
 #include <string>
 
+#include "qsd/fileops/change_journal.h"
 #include "qsd/fileops/copy_outcome.h"
 #include "qsd/fileops/image_tree.h"
 #include "qsd/text/plan.h"
@@ -44,6 +45,8 @@ struct TreePass {
     // Told each action (mkdir, create, replace, same, keep) as it is taken,
     // or, checking, as it would be.
     ActionSink* sink = nullptr;
+    // Copying: told before and after each change, so it can be taken back.
+    ChangeJournal* journal = nullptr;
 };
 
 // Copies the tree below `src` into `dst_dir` (shown as `dst_shown`, ending
@@ -55,6 +58,12 @@ struct TreePass {
 int copy_tree(const ImageRoot& root, const ImageEntry& src, const std::string& src_shown,
               int dst_dir, const std::string& dst_shown, unsigned flags,
               const ServerDirGuard& guard, const TreePass& pass = {});
+
+// Copies one image file as copy_file_at does, telling `journal` (may be
+// null) before and after when the copy creates or replaces the file.
+int journaled_copy(ChangeJournal* journal, Action action, const ImageEntry& entry,
+                   const std::string& src_shown, int dst_dir, const std::string& name,
+                   const std::string& dst_shown, unsigned flags);
 
 // Whether a copy of the open image file into `name` of `dst_dir` (-1: a
 // directory still to be made) would fail, without copying: a source that is

@@ -106,8 +106,11 @@ zr7::ServerDirGuard Installer610::server_dir_guard() {
         std::string made;
         const int status = zr7::backup_file(path.c_str(), "VXAENV", path.c_str(),
                                             zr7::backup_stamp(std::time(nullptr)), made);
-        if (status == 0)
+        if (status == 0) {
+            if (journal_or_null() != nullptr)
+                (void)journal->note("backup", made);
             on_action(zr7::Action::kBackup, made, "");
+        }
         return status;
     };
     return guard;

@@ -8,6 +8,7 @@
 
 #include "qsd/fileops/install_util.h"
 #include "qsd/installer/installer610.h"
+#include "qsd/installer/run_store.h"
 #include "qsd/platform/directory_lock.h"
 #include "qsd/platform/interruption.h"
 #include "qsd/platform/trace.h"
@@ -15,10 +16,7 @@
 int Installer610::init(const std::string& src_dir, const std::string& home_dir) {
     ZR7_OPERATION("Installer610::init");
     source_path = src_dir;
-    home_path = home_dir.empty() ? "./" : home_dir;
-    char cwd[PATH_MAX];
-    working_dir = ::getcwd(cwd, sizeof cwd) != nullptr ? cwd : "";
-    (void)open_home();
+    init_home(home_dir);
     int status = read_config(home_path);
     // The server name and the architecture name directories under the home:
     // "..", a "/" or a control byte would reach another directory or break
@@ -50,6 +48,14 @@ int Installer610::init(const std::string& src_dir, const std::string& home_dir) 
     ZR7_RETURN(status);
 }
 
+void Installer610::init_home(const std::string& home_dir) {
+    home_path = home_dir.empty() ? "./" : home_dir;
+    char cwd[PATH_MAX];
+    working_dir = ::getcwd(cwd, sizeof cwd) != nullptr ? cwd : "";
+    (void)open_home();
+    add_path_symbol("HOMEPATH", home_path.c_str());
+}
+
 int Installer610::go() {
     ZR7_OPERATION("Installer610::go");
     // Two installations into one server take turns: their copies would race
@@ -75,6 +81,8 @@ int Installer610::go() {
     // a run is its error alone.
     if (status != 0 && preview)
         plan = zr7::Plan();
+    if (status == 0 && !preview)
+        status = begin_run_dir(true);
     if (status == 0 && !preview)
         status = process_commands(commands);
     // What was installed is on the disk before the run reports it.
@@ -117,6 +125,31 @@ int Installer610::process_commands(CommandList& commands) {
             ZR7_RETURN(status);
     }
     ZR7_RETURN(0);
+}
+
+int Installer610::begin_run_dir(bool with_journal) {
+    ZR7_TRACED("Installer610::go");
+    const std::string store_path = home_path + zr7::kRunStoreName;
+    zr7::fs::UniqueFd store;
+    int error = home_fd.valid() ? zr7::open_run_store(home_fd.get(), store) : EBADF;
+    if (error == 0) {
+        // An installing run makes room for its journal; an undo removes
+        // nothing (the journal it takes back may be the oldest one kept).
+        if (with_journal)
+            zr7::prune_runs(store.get(), zr7::kKeptJournals - 1);
+        error = zr7::create_run_dir(store.get(), run_id, run_dir);
+    }
+    if (error == 0 && with_journal) {
+        journal = std::make_unique<zr7::Journal>(
+            symbols.find("HOMEPATH") != nullptr ? *symbols.find("HOMEPATH") : home_path);
+        error = journal->open(run_dir.get());
+    }
+    if (error != 0) {
+        ZR7_ERROR("Error: Can't keep the record of the run in <%s>", store_path.c_str());
+        ZR7_ERROR("Error: <%s>: %s", store_path.c_str(), zr7::fs::error_text(error).c_str());
+        return -8;
+    }
+    return 0;
 }
 
 void Installer610::on_action(zr7::Action action, const std::string& path, const std::string& diff) {

@@ -1,6 +1,7 @@
 // Installer610: the state and the steps of one installation run.
 #pragma once
 
+#include <memory>
 #include <string>
 #include <utility>
 #include <vector>
@@ -8,6 +9,7 @@
 #include "qsd/fileops/copy_outcome.h"
 #include "qsd/fileops/image_tree.h"
 #include "qsd/fileops/tree_walk.h"
+#include "qsd/installer/journal.h"
 #include "qsd/installer/run_observer.h"
 #include "qsd/installer/simple_command.h"
 #include "qsd/platform/fs.h"
@@ -37,6 +39,9 @@ class Installer610 : public zr7::ActionSink {
 
     // The install run.
     int init(const std::string& src_dir, const std::string& home_dir);
+    // The part of init an undo needs: the installation directory, open, and
+    // the working directory.
+    void init_home(const std::string& home_dir);
     int go();
     int process_commands(CommandList& commands);
     // Every command's checks, changing nothing (preflight.cpp): 0, or the
@@ -89,6 +94,17 @@ class Installer610 : public zr7::ActionSink {
                   bool check_only);
     int tree_copy(const std::string& src_template, const std::string& dst_template,
                   const std::string& options, bool check_only);
+    // Opens the installation's run store and this run's directory in it
+    // (run_dir, run_id), with a journal for an installing run; removes the
+    // run directories past the newest kKeptJournals journals first. 0, or a
+    // status after an error line.
+    int begin_run_dir(bool with_journal);
+    zr7::ChangeJournal* journal_or_null() {
+        return journal && journal->active() ? journal.get() : nullptr;
+    }
+    // Takes the newest installation not yet undone back (undo.cpp). 0, or the
+    // status of the undo.
+    int undo();
     // The bytes a preview's planned file would have (read from the image).
     int read_planned(const zr7::PlannedFile& file, std::string& content);
 
@@ -121,8 +137,11 @@ class Installer610 : public zr7::ActionSink {
     bool preview = false;                                      // -n: tell the plan, change nothing
     zr7::RunObserver* observer = nullptr;                      // the driver's, may be null
     zr7::Plan plan;                                            // the actions so far
-    zr7::PlannedTree planned;     // checking: what the commands would have made
-    zr7::StringList error_lines;  // every "Error:" line of the run
-    std::size_t error_mark = 0;   // the first error line of the current step
-    std::string working_dir;      // makes the plan's paths absolute
+    zr7::PlannedTree planned;               // checking: what the commands would have made
+    zr7::StringList error_lines;            // every "Error:" line of the run
+    std::size_t error_mark = 0;             // the first error line of the current step
+    std::string working_dir;                // makes the plan's paths absolute
+    zr7::fs::UniqueFd run_dir;              // this run's directory in the run store
+    std::string run_id;                     // its name
+    std::unique_ptr<zr7::Journal> journal;  // an installing run's
 };

@@ -1,10 +1,12 @@
 #include "qsd/installer/run_store.h"
 
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <algorithm>
 
 #include "qsd/fileops/tree_walk.h"
+#include "qsd/installer/journal.h"
 
 namespace zr7 {
 
@@ -62,6 +64,56 @@ int create_run_dir(int store_fd, std::string& id, fs::UniqueFd& out) {
     // The run lock keeps other runs out, and the name is one no run had.
     id = next_run_id(run_ids(store_fd), std::time(nullptr), static_cast<long>(::getpid()));
     return fs::make_private_dir(store_fd, id, out);
+}
+
+namespace {
+
+// Removes what `dir` holds: files, and directories with what they hold.
+int empty_dir(int dir) {
+    StringList names;
+    if (const int error = list_names(dir, names))
+        return error;
+    for (const std::string& name : names) {
+        struct stat st {};
+        if (fs::stat_at(dir, name, st) != 0)
+            continue;
+        if (S_ISDIR(st.st_mode)) {
+            fs::UniqueFd sub;
+            if (fs::open_dir_below(dir, name, sub) == 0)
+                (void)empty_dir(sub.get());
+            if (const int error = fs::remove_dir(dir, name))
+                return error;
+        } else if (const int error = fs::remove_file(dir, name)) {
+            return error;
+        }
+    }
+    return 0;
+}
+
+}  // namespace
+
+int remove_run_dir(int store_fd, const std::string& id) {
+    fs::UniqueFd run;
+    if (const int error = fs::open_dir_below(store_fd, id, run))
+        return error;
+    if (const int error = empty_dir(run.get()))
+        return error;
+    return fs::remove_dir(store_fd, id);
+}
+
+void prune_runs(int store_fd, std::size_t keep) {
+    const StringList ids = run_ids(store_fd);
+    std::size_t journals = 0;
+    for (std::size_t i = ids.size(); i-- > 0;) {
+        struct stat st {};
+        fs::UniqueFd run;
+        if (journals >= keep) {
+            (void)remove_run_dir(store_fd, ids[i]);
+        } else if (fs::open_dir_below(store_fd, ids[i], run) == 0 &&
+                   fs::stat_at(run.get(), kJournalFile, st) == 0) {
+            ++journals;
+        }
+    }
 }
 
 int write_run_file(int run_fd, const std::string& name, const std::string& content) {

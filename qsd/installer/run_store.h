@@ -33,6 +33,17 @@ StringList run_ids(int store_fd);
 // Creates the directory of a new run in the store. 0 or an error number.
 int create_run_dir(int store_fd, std::string& id, fs::UniqueFd& out);
 
+// How many installing runs keep their journal; the run directories older
+// than the oldest of them are removed when a run starts.
+constexpr std::size_t kKeptJournals = 10;
+
+// Removes the run directories older than the newest `keep` that hold a
+// journal. Backups under .archive are never touched.
+void prune_runs(int store_fd, std::size_t keep);
+
+// Removes a run directory and everything in it, no link followed.
+int remove_run_dir(int store_fd, const std::string& id);
+
 // Writes (or replaces) a file of a run directory, whole, on the disk.
 int write_run_file(int run_fd, const std::string& name, const std::string& content);
 

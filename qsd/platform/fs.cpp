@@ -361,6 +361,18 @@ int make_private_dir(int dir, const std::string& name, UniqueFd& out) {
     return 0;
 }
 
+int link_at(int from_dir, const std::string& from, int to_dir, const std::string& to) {
+    return ::linkat(from_dir, from.c_str(), to_dir, to.c_str(), 0) == 0 ? 0 : errno;
+}
+
+int rename_at(int from_dir, const std::string& from, int to_dir, const std::string& to) {
+    return ::renameat(from_dir, from.c_str(), to_dir, to.c_str()) == 0 ? 0 : errno;
+}
+
+int remove_dir(int dir, const std::string& name) {
+    return ::unlinkat(dir, name.c_str(), AT_REMOVEDIR) == 0 ? 0 : errno;
+}
+
 int remove_file(int dir, const std::string& name) {
     return ::unlinkat(dir, name.c_str(), 0) == 0 ? 0 : errno;
 }
@@ -441,6 +453,22 @@ int AtomicReplace::adopt_attributes(mode_t new_mode, mode_t add_bits) {
 int AtomicReplace::commit(mode_t new_mode, mode_t add_bits) {
     if (const int failed = adopt_attributes(new_mode, add_bits))
         return failed;
+    if (const int failed = sync_scratch())
+        return failed;
+    if (::renameat(dir_, scratch_.c_str(), dir_, name_.c_str()) != 0)
+        return errno;
+    scratch_.clear();
+    if (sync_ && ::fsync(dir_) != 0)
+        return errno;
+    return 0;
+}
+
+int AtomicReplace::commit_like(const struct stat& like) {
+    const int fd = scratch_fd_.get();
+    if (::geteuid() == 0 && ::fchown(fd, like.st_uid, like.st_gid) != 0)
+        return errno;
+    if (::fchmod(fd, like.st_mode & 07777) != 0)
+        return errno;
     if (const int failed = sync_scratch())
         return failed;
     if (::renameat(dir_, scratch_.c_str(), dir_, name_.c_str()) != 0)

@@ -105,6 +105,15 @@ int make_dir(int dir, const std::string& name, UniqueFd& out, bool* created = nu
 // (kNotPrivate): what root reads back from it decides what root writes.
 int make_private_dir(int dir, const std::string& name, UniqueFd& out);
 
+// A second name for a file (the name itself, never a link's target), and a
+// rename, between two open directories. 0 or errno (EXDEV across file
+// systems, EEXIST for a link name that is taken).
+int link_at(int from_dir, const std::string& from, int to_dir, const std::string& to);
+int rename_at(int from_dir, const std::string& from, int to_dir, const std::string& to);
+
+// Removes an empty directory. 0 or errno (ENOTEMPTY when it holds anything).
+int remove_dir(int dir, const std::string& name);
+
 // Removes a file (never a directory). 0 or errno.
 int remove_file(int dir, const std::string& name);
 
@@ -139,6 +148,9 @@ class AtomicReplace {
     // Gives the scratch file the attributes commit gives it (those of the
     // file it replaces, or of a new file). 0 or errno.
     int adopt_attributes(mode_t new_mode = 0666, mode_t add_bits = 0);
+    // As commit, with the owner, group and mode of `like` (a file put back as
+    // it was).
+    int commit_like(const struct stat& like);
     // Gives the scratch file a second name that never replaces a file: for
     // backups. EEXIST when the name is taken. The scratch file still goes
     // when the object does.

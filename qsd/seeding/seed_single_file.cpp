@@ -103,6 +103,10 @@ int Installer610::seed_single_file(const std::string& dst_dir, const std::string
         ZR7_DETAIL("issuing cmd <%s> ", command.c_str());
         if (observer != nullptr)
             observer->on_seeding(file_name);
+        // Journaled before the loader runs: the catalog may change even when
+        // the loader fails.
+        if (journal_or_null() != nullptr)
+            (void)journal->note("seed", dst_dir + "/" + file_name);
         (void)::lseek(response.fd(), 0, SEEK_SET);
         status = run_loader(response.fd(), log_fd.get());
         // Given to the loader, whatever it made of it: the catalog may hold

@@ -27,6 +27,58 @@ std::string escape_controls(const std::string& text) {
     return out;
 }
 
+namespace {
+
+int hex_digit(char c) {
+    if (c >= '0' && c <= '9')
+        return c - '0';
+    if (c >= 'a' && c <= 'f')
+        return c - 'a' + 10;
+    return -1;
+}
+
+}  // namespace
+
+bool unescape_controls(const std::string& text, std::string& out) {
+    out.clear();
+    for (std::size_t i = 0; i < text.size(); ++i) {
+        if (is_control_byte(text[i]))
+            return false;
+        if (text[i] != '\\') {
+            out += text[i];
+            continue;
+        }
+        if (++i == text.size())
+            return false;
+        switch (text[i]) {
+            case '\\':
+                out += '\\';
+                break;
+            case 'r':
+                out += '\r';
+                break;
+            case 'n':
+                out += '\n';
+                break;
+            case 't':
+                out += '\t';
+                break;
+            case 'x': {
+                const int high = i + 2 < text.size() ? hex_digit(text[i + 1]) : -1;
+                const int low = high >= 0 ? hex_digit(text[i + 2]) : -1;
+                if (low < 0)
+                    return false;
+                out += static_cast<char>(high * 16 + low);
+                i += 2;
+                break;
+            }
+            default:
+                return false;
+        }
+    }
+    return true;
+}
+
 bool has_control_byte(const std::string& text) {
     for (char c : text) {
         if (is_control_byte(c))

@@ -12,6 +12,10 @@ namespace zr7 {
 // without such bytes comes back unchanged and the result is one line.
 std::string escape_controls(const std::string& text);
 
+// The bytes an escaped text stands for: the inverse of escape_controls.
+// False for a text that escape_controls cannot have written.
+bool unescape_controls(const std::string& text, std::string& out);
+
 // True for a byte below 0x20 or 0x7f.
 inline bool is_control_byte(char c) {
     const unsigned char u = static_cast<unsigned char>(c);

@@ -27,6 +27,7 @@ const char* const kUsage =
     "           only option, exit right away.\n"
     "  -n       Preview: print each change the installation would make,\n"
     "           and change nothing.\n"
+    "  -u       Undo the newest installation not yet undone (no src_dir).\n"
     "  --help   Print this text on standard output and exit.\n"
     "  --version Print the version line on standard output and exit.\n";
 

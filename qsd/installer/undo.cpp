@@ -1,0 +1,299 @@
+// Undo: the newest installation not yet undone, taken back from its journal.
+// Replaced files get their old version back (the kept file renamed into
+// place: bytes, mode, owner and group as they were), created files are
+// removed and created directories removed when empty, VXAENV is backed up
+// before it gets its old content back. A file whose bytes changed since the
+// installation wrote it is left as it is and reported. Each step can be
+// taken again after a kill: a repeated undo finds what is done already.
+#include <sys/stat.h>
+
+#include <algorithm>
+#include <ctime>
+#include <map>
+#include <set>
+
+#include "qsd/envfile/backup.h"
+#include "qsd/installer/installer610.h"
+#include "qsd/installer/run_store.h"
+#include "qsd/platform/directory_lock.h"
+#include "qsd/platform/interruption.h"
+#include "qsd/platform/trace.h"
+
+namespace {
+
+constexpr const char* kUndoneMark = "undone";
+
+// What the journal says of one path.
+struct PathHistory {
+    std::string first;  // "mkdir", "create" or "replace"
+    std::string kept;
+    bool installed = false;
+    zr7::ContentDigest digest;  // the bytes the run left, when installed
+};
+
+std::string dir_part(const std::string& path) {
+    const std::size_t slash = path.find_last_of('/');
+    return slash == std::string::npos ? "." : path.substr(0, slash);
+}
+
+std::string name_part(const std::string& path) {
+    const std::size_t slash = path.find_last_of('/');
+    return slash == std::string::npos ? path : path.substr(slash + 1);
+}
+
+bool is_kept_name(const std::string& name) {
+    return !name.empty() && name.size() < 12 &&
+           std::all_of(name.begin(), name.end(), [](char c) { return c >= '0' && c <= '9'; });
+}
+
+// The digest of a regular file, false when there is none to read.
+bool digest_of(int dir, const std::string& name, zr7::ContentDigest& out, struct stat& st) {
+    zr7::fs::UniqueFd file;
+    return zr7::fs::stat_at(dir, name, st) == 0 && S_ISREG(st.st_mode) &&
+           zr7::fs::open_read(dir, name, file, st) == 0 &&
+           zr7::digest_file(file.get(), false, out) == 0;
+}
+
+}  // namespace
+
+int Installer610::undo() {
+    ZR7_OPERATION("Installer610::undo");
+    plan = zr7::Plan(zr7::PlanKind::kUndo);
+    std::unique_ptr<zr7::DirectoryLock> run_lock;
+    if (!preview) {
+        run_lock = std::make_unique<zr7::DirectoryLock>(home_path);
+        if (run_lock->failure() == zr7::kStatusInterrupted)
+            ZR7_RETURN(interrupted());
+        if (run_lock->failure() != 0)
+            ZR7_RETURN(run_lock->failure());
+    }
+    error_mark = error_lines.size();
+    int status_of_start = 0;
+    const std::string home = symbols.find("HOMEPATH") != nullptr ? *symbols.find("HOMEPATH") : "";
+    const std::string store_path = home + "/" + zr7::kRunStoreName;
+
+    // The newest run with a journal and no mark of its undo.
+    zr7::fs::UniqueFd store;
+    zr7::fs::UniqueFd run;
+    std::string id;
+    struct stat st {};
+    int error = zr7::fs::open_dir_below(home_fd.get(), zr7::kRunStoreName, store);
+    if (error == 0) {
+        // Opened by the link rule; the store must still be ours alone.
+        zr7::fs::UniqueFd checked;
+        error = zr7::fs::make_private_dir(home_fd.get(), zr7::kRunStoreName, checked);
+    }
+    if (error != 0 && error != ENOENT) {
+        ZR7_ERROR("Error: Can't open <%s>", store_path.c_str());
+        ZR7_ERROR("Error: <%s>: %s", store_path.c_str(), zr7::fs::error_text(error).c_str());
+        ZR7_RETURN(-8);
+    }
+    if (error == 0) {
+        const zr7::StringList ids = zr7::run_ids(store.get());
+        for (std::size_t i = ids.size(); i-- > 0 && id.empty();) {
+            zr7::fs::UniqueFd candidate;
+            if (zr7::fs::open_dir_below(store.get(), ids[i], candidate) == 0 &&
+                zr7::fs::stat_at(candidate.get(), zr7::kJournalFile, st) == 0 &&
+                zr7::fs::stat_at(candidate.get(), kUndoneMark, st) != 0) {
+                id = ids[i];
+                run = std::move(candidate);
+            }
+        }
+    }
+    if (id.empty()) {
+        ZR7_ERROR("Error: Nothing to undo in <%s>", home.c_str());
+        ZR7_RETURN(-12);
+    }
+    ZR7_DETAIL("Undoing the run <%s>", id.c_str());
+    if (!preview && (status_of_start = begin_run_dir(false)) != 0)
+        ZR7_RETURN(status_of_start);
+
+    zr7::fs::UniqueFd journal_file;
+    zr7::fs::UniqueFd kept_dir;
+    std::string text;
+    error = zr7::fs::open_read(run.get(), zr7::kJournalFile, journal_file, st);
+    if (error == 0)
+        error = zr7::fs::read_all(journal_file.get(), text);
+    if (error == 0)
+        error = zr7::fs::open_dir_below(run.get(), zr7::kKeptDir, kept_dir);
+    if (error != 0) {
+        const std::string shown = store_path + "/" + id + "/" + zr7::kJournalFile;
+        ZR7_ERROR("Error: Can't open <%s>", shown.c_str());
+        ZR7_ERROR("Error: <%s>: %s", shown.c_str(), zr7::fs::error_text(error).c_str());
+        ZR7_RETURN(-8);
+    }
+
+    // What the journal says, path by path, in the order the run first
+    // touched them; undone in the opposite order.
+    std::map<std::string, PathHistory> history;
+    zr7::StringList order;
+    zr7::StringList seeded;
+    for (const zr7::JournalEntry& entry : zr7::parse_journal(text)) {
+        if (entry.kind == "seed") {
+            seeded.push_back(entry.path);
+            continue;
+        }
+        if (entry.kind == "backup")
+            continue;
+        PathHistory& path = history[entry.path];
+        if (entry.kind == "installed") {
+            path.installed = true;
+            path.digest = entry.digest;
+        } else if (path.first.empty()) {
+            path.first = entry.kind;
+            path.kept = entry.kept;
+            order.push_back(entry.path);
+        }
+    }
+
+    int conflicts = 0;
+    int status = 0;
+    std::set<std::string> removed;  // what this undo removed, or would
+    for (std::size_t i = order.size(); i-- > 0 && status == 0;) {
+        if (!preview && zr7::interruption() != 0)
+            ZR7_RETURN(interrupted());
+        const std::string& relative = order[i];
+        const PathHistory& path = history[relative];
+        const std::string shown = home + "/" + relative;
+        const std::string name = name_part(relative);
+        zr7::fs::UniqueFd dir;
+        if (zr7::fs::open_dir_below(home_fd.get(), dir_part(relative), dir) != 0)
+            continue;  // gone with its directory: nothing left to take back
+        if (path.first == "mkdir") {
+            zr7::StringList inside;
+            zr7::fs::UniqueFd made;
+            if (zr7::fs::stat_at(dir.get(), name, st) != 0 || !S_ISDIR(st.st_mode) ||
+                zr7::fs::open_dir_below(dir.get(), name, made) != 0 ||
+                zr7::list_names(made.get(), inside) != 0 ||
+                std::any_of(inside.begin(), inside.end(), [&](const std::string& entry) {
+                    return removed.count(relative + "/" + entry) == 0;  // a preview's
+                })) {
+                continue;  // gone, or holding what others put there
+            }
+            if (!preview && (error = zr7::fs::remove_dir(dir.get(), name)) != 0) {
+                ZR7_ERROR("Error: Can't remove <%s>", shown.c_str());
+                ZR7_ERROR("Error: <%s>: %s", shown.c_str(), zr7::fs::error_text(error).c_str());
+                status = -5;
+                break;
+            }
+            removed.insert(relative);
+            on_action(zr7::Action::kRmdir, shown, "");
+            continue;
+        }
+        zr7::ContentDigest now;
+        struct stat now_st {};
+        const bool present = digest_of(dir.get(), name, now, now_st);
+        const bool as_installed = !path.installed || (present && now == path.digest);
+        if (path.first == "create") {
+            if (!present && zr7::fs::stat_at(dir.get(), name, st) != 0)
+                continue;  // removed already
+            if (!present || !as_installed) {
+                ZR7_DETAIL("Changed since the installation: <%s>", shown.c_str());
+                on_action(zr7::Action::kConflict, shown, "");
+                ++conflicts;
+                continue;
+            }
+            if (!preview && (error = zr7::fs::remove_file(dir.get(), name)) != 0) {
+                ZR7_ERROR("Error: Can't remove <%s>", shown.c_str());
+                ZR7_ERROR("Error: <%s>: %s", shown.c_str(), zr7::fs::error_text(error).c_str());
+                status = -5;
+                break;
+            }
+            removed.insert(relative);
+            on_action(zr7::Action::kRemove, shown, "");
+            continue;
+        }
+        // A replaced file: its kept version goes back, unless it is back
+        // already (the kept file gone, or the same bytes in place).
+        zr7::ContentDigest old;
+        struct stat old_st {};
+        if (!is_kept_name(path.kept) || !digest_of(kept_dir.get(), path.kept, old, old_st))
+            continue;
+        if (present && now == old) {
+            if (!preview)
+                (void)zr7::fs::remove_file(kept_dir.get(), path.kept);
+            continue;
+        }
+        if (!present || !as_installed) {
+            ZR7_DETAIL("Changed since the installation: <%s>", shown.c_str());
+            on_action(zr7::Action::kConflict, shown, "");
+            ++conflicts;
+            continue;
+        }
+        const bool env_file = name == "VXAENV";
+        std::string before_text;
+        std::string old_text;
+        if (env_file) {
+            // The environment file as it is now is backed up first, under a
+            // name no backup has.
+            zr7::fs::UniqueFd current;
+            zr7::fs::UniqueFd kept;
+            struct stat ignored {};
+            (void)(zr7::fs::open_read(dir.get(), name, current, ignored) == 0 &&
+                   zr7::fs::read_all(current.get(), before_text) == 0);
+            (void)(zr7::fs::open_read(kept_dir.get(), path.kept, kept, ignored) == 0 &&
+                   zr7::fs::read_all(kept.get(), old_text) == 0);
+            std::string backup;
+            const std::string dir_shown = home + "/" + dir_part(relative);
+            if (preview) {
+                backup = planned_env_backup(dir.get(), dir_shown);
+            } else if (zr7::backup_content_at(dir.get(), dir_shown, name, before_text,
+                                              now_st.st_mode, zr7::backup_stamp(std::time(nullptr)),
+                                              backup) != 0) {
+                ZR7_ERROR("Error: Can't backup VXAENV");
+                status = -9;
+                break;
+            }
+            on_action(zr7::Action::kBackup, backup, "");
+        }
+        if (!preview) {
+            error = zr7::fs::rename_at(kept_dir.get(), path.kept, dir.get(), name);
+            if (error == EXDEV) {
+                // Kept by a copy on another file system: copied back whole.
+                zr7::fs::UniqueFd kept;
+                std::string content;
+                zr7::fs::AtomicReplace back(dir.get(), name, env_file);
+                error = zr7::fs::open_read(kept_dir.get(), path.kept, kept, old_st);
+                if (error == 0)
+                    error = zr7::fs::read_all(kept.get(), content);
+                if (error == 0)
+                    error = back.open();
+                if (error == 0)
+                    error = zr7::fs::write_all(back.fd(), content);
+                if (error == 0)
+                    error = back.commit_like(old_st);
+                if (error == 0)
+                    (void)zr7::fs::remove_file(kept_dir.get(), path.kept);
+            }
+            if (error == 0 && env_file)
+                error = zr7::fs::sync_fd(dir.get());
+            if (error != 0) {
+                ZR7_ERROR("Error: Can't restore <%s>", shown.c_str());
+                ZR7_ERROR("Error: <%s>: %s", shown.c_str(), zr7::fs::error_text(error).c_str());
+                status = -5;
+                break;
+            }
+        }
+        if (env_file)
+            on_action(zr7::Action::kVxaenv, shown,
+                      zr7::unified_diff(before_text, old_text, "VXAENV"));
+        else
+            on_action(zr7::Action::kRestore, shown, "");
+    }
+    if (status == 0) {
+        for (const std::string& relative : seeded)
+            on_action(zr7::Action::kSeeded, home + "/" + relative, "");
+        // The run is undone, as far as it can be: the next undo goes on with
+        // the installation before it.
+        if (!preview && (error = zr7::write_run_file(run.get(), kUndoneMark, run_id + "\n")) != 0) {
+            ZR7_ERROR("Error: Can't mark <%s> undone", (store_path + "/" + id).c_str());
+            status = -8;
+        }
+    }
+    if (status == 0 && conflicts > 0) {
+        ZR7_ERROR("Error: %d files changed since the installation were left as they are",
+                  conflicts);
+        status = -13;
+    }
+    ZR7_RETURN(status);
+}
