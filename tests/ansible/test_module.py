@@ -163,20 +163,25 @@ class Records(unittest.TestCase):
         self.assertIs(m.own_record(records, "install", ["-h", "/h", "/img"]), mine)
         self.assertIsNone(m.own_record(records, "undo", ["-h", "/h", "/img"]))
 
-    def test_pending_installs(self):
-        a, b, c = rec("install", image="/a/"), rec("install", image="/b/"), rec("install", image="/c/")
+    def test_newest_undoable(self):
+        j, u = True, True
         cases = [
-            ([], []),
-            ([a, b], [a, b]),
-            ([a, b, rec("undo")], [a]),
-            ([a, b, rec("undo"), c], [a, c]),
-            ([a, rec("undo", status="failure")], [a]),
-            ([a, rec("install", status="failure", manifest=None)], [a]),
-            ([a, rec("undo"), rec("undo")], []),
+            ([], None),
+            ([("000001-a", j, False)], "000001-a"),
+            ([("000001-a", j, False), ("000002-b", j, False)], "000002-b"),
+            ([("000002-b", j, u), ("000001-a", j, False)], "000001-a"),
+            ([("000001-a", j, False), ("000002-undo", False, False)], "000001-a"),
+            ([("000001-a", j, u), ("000002-b", j, u)], None),
+            ([("000001-a", j, False), ("scratch", j, False)], "000001-a"),
         ]
-        for records, pending in cases:
-            with self.subTest(records=records):
-                self.assertEqual(m.pending_installs(records), pending)
+        for runs, newest in cases:
+            with self.subTest(runs=runs):
+                self.assertEqual(m.newest_undoable(runs), newest)
+
+    def test_install_record(self):
+        a, b = rec("install", run="000001-a", image="/a"), rec("undo", run="000002-b")
+        self.assertIs(m.install_record([a, b], "000001-a"), a)
+        self.assertIsNone(m.install_record([a, b], "000002-b"))
 
 
 class Messages(unittest.TestCase):
@@ -188,6 +193,16 @@ class Messages(unittest.TestCase):
         self.assertEqual(m.log_path("", "/h", exists=lambda path: True), "/h/logs/qsdinst.log")
         self.assertIsNone(m.log_path("Error: Installation directory </h> does not exist\n", "/h",
                                      exists=lambda path: False))
+
+    def test_nothing_to_undo(self):
+        self.assertTrue(m.nothing_to_undo(["Error: Nothing to undo in </h/>"]))
+        self.assertFalse(m.nothing_to_undo(["Error: Can't open </h/.zr7inst>", "Error: Nothing to undo"]))
+        self.assertFalse(m.nothing_to_undo([]))
+
+    def test_without_rc(self):
+        result = {"rc": 244, "msg": "x"}
+        self.assertEqual(m.without_rc(result), {"exit_status": 244, "msg": "x"})
+        self.assertEqual(result["rc"], 244)
 
     def test_reason(self):
         self.assertEqual(m.reason(["Error: a", "Error: b"], "x\n"), "Error: a; Error: b")

@@ -119,9 +119,14 @@ changed:
   type: bool
 rc:
   description: The tool's exit status.
-  returned: when the tool ran
+  returned: when the tool ran, except when there was nothing to undo
   type: int
   sample: 0
+exit_status:
+  description: The tool's exit status when there was nothing to undo (244), which fails no task.
+  returned: when an undo found nothing to undo
+  type: int
+  sample: 244
 cmd:
   description: The argument vector the tool was started with.
   returned: when the tool ran
@@ -192,6 +197,13 @@ DIFF_LISTS = (
 )
 NOTHING_TO_UNDO = "Error: Nothing to undo"
 RECORD_NAME = "qsdinst.json"
+# The tool's store of runs in the home: a directory per run, named from a
+# six-digit sequence number; an installing run keeps its journal there, and
+# an undo marks the run it took back.
+RUN_STORE = ".zr7inst"
+RUN_DIR_NAME = re.compile(r"^[0-9]{6}-")
+JOURNAL_NAME = "journal"
+UNDONE_NAME = "undone"
 LOG_NAME = "qsdinst.log"
 FAILED_LINE = re.compile(r"installation failed with exit status -?\d+; see (.+)$")
 
@@ -314,6 +326,20 @@ def error_lines(stderr):
     return [line for line in stderr.splitlines() if line.startswith("Error: ")]
 
 
+def nothing_to_undo(errors):
+    """Whether an undo failed only for want of an installation to undo."""
+    return len(errors) == 1 and errors[0].startswith(NOTHING_TO_UNDO)
+
+
+def without_rc(result):
+    """A result that is no failure although the tool's status is not 0:
+    Ansible fails any task whose result has a non-zero rc, so the status
+    goes under exit_status."""
+    result = dict(result)
+    result["exit_status"] = result.pop("rc")
+    return result
+
+
 def reason(errors, stderr):
     """The reason of a failure in one line: the "Error:" lines, else the
     tool's first line on standard error (a refused command line)."""
@@ -359,17 +385,22 @@ def own_record(records, operation, arguments):
     return None
 
 
-def pending_installs(records):
-    """The installations not undone yet, oldest first: an installation that
-    left a manifest can be undone, and every successful undo takes back the
-    newest one."""
-    pending = []
+def newest_undoable(runs):
+    """The run an undo takes back, as the tool chooses it: the newest run
+    directory (names sort in the order the runs began) that holds a journal
+    and no mark of its undo. `runs` holds (name, has_journal, is_undone)."""
+    for name, journal, undone in sorted(runs, reverse=True):
+        if RUN_DIR_NAME.match(name) and journal and not undone:
+            return name
+    return None
+
+
+def install_record(records, run):
+    """The record of the installing run `run`, or None."""
     for record in records:
-        if record.get("operation") == "install" and record.get("manifest"):
-            pending.append(record)
-        elif record.get("operation") == "undo" and record.get("status") == "success" and pending:
-            pending.pop()
-    return pending
+        if record.get("operation") == "install" and record.get("run") == run:
+            return record
+    return None
 
 
 def same_directory(a, b):
@@ -404,20 +435,40 @@ def read_text(path):
         return None
 
 
+def store_runs(home):
+    """The run directories of the home's store, as newest_undoable takes them."""
+    store = os.path.join(home, RUN_STORE)
+    try:
+        names = os.listdir(store)
+    except (IOError, OSError):
+        return []
+    return [
+        (
+            name,
+            os.path.isfile(os.path.join(store, name, JOURNAL_NAME)),
+            os.path.lexists(os.path.join(store, name, UNDONE_NAME)),
+        )
+        for name in names
+    ]
+
+
 def guard_undo(module, record_file):
     """With an image given, undo only an installation of that image."""
     image = module.params.get("image")
     if module.params["state"] != "undone" or not image:
         return
-    pending = pending_installs(appended_records(read_from(record_file, 0)))
-    if not pending:
+    home = module.params["home"]
+    run = newest_undoable(store_runs(home))
+    if run is None:
         module.exit_json(changed=False, msg="Nothing to undo")
-    newest = pending[-1].get("image")
+    record = install_record(appended_records(read_from(record_file, 0)), run)
+    newest = record.get("image") if record else None
     if not same_directory(newest, image):
         module.exit_json(
             changed=False,
-            msg="The newest installation in %s is of %s, not %s; nothing undone"
-            % (module.params["home"], newest, image),
+            run=run,
+            msg="The newest installation in %s (run %s) is not of %s but of %s; nothing undone"
+            % (home, run, image, newest or "an image it has no record of"),
         )
 
 
@@ -440,8 +491,8 @@ def preview(module, tool):
         stderr=stderr,
         errors=errors,
     )
-    if undo and rc != 0 and NOTHING_TO_UNDO in errors:
-        module.exit_json(changed=False, msg="Nothing to undo", **result)
+    if undo and rc != 0 and nothing_to_undo(errors):
+        module.exit_json(changed=False, msg="Nothing to undo", **without_rc(result))
     if rc != 0:
         module.fail_json(
             changed=False, msg="zr7inst would fail with exit status %d: %s" % (rc, reason(errors, stderr)), **result
@@ -474,8 +525,8 @@ def run(module, tool, record_file):
             if module._diff:
                 result["diff"] = plan_diff(plan, params["home"])
     changed = bool(record.get("changed")) if record is not None else False
-    if undo and rc != 0 and NOTHING_TO_UNDO in errors:
-        module.exit_json(changed=changed, msg="Nothing to undo", **result)
+    if undo and rc != 0 and nothing_to_undo(errors):
+        module.exit_json(changed=changed, msg="Nothing to undo", **without_rc(result))
     if rc != 0:
         msg = "zr7inst failed with exit status %d: %s" % (rc, reason(errors, stderr))
         if result["log"]:
