@@ -33,6 +33,7 @@ fi
 # One image for every server; srv3's kmsenv names an architecture that would
 # lead out of its directory, which the tool refuses.
 cp -R "$repo/examples/sample/image" "$work/image"
+cp -R "$repo/examples/sample/image" "$work/image2"
 hosts=(srv1 srv2 srv3 srv4 srv5)
 for host in "${hosts[@]}"; do
     cp -R "$repo/examples/sample/home" "$work/$host"
