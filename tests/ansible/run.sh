@@ -24,10 +24,14 @@ python=$(sed -n '1s/^#! *\([^ ]*\).*/\1/p' "$(command -v ansible-playbook)")
 [ -x "$python" ] || python=python3
 
 work=$(mktemp -d "${TMPDIR:-/tmp}/zr7-fleet.XXXXXX")
+# Ansible's own temporary directories go through a shell of its own, which
+# takes no blank in their path: they stay below /tmp whatever TMPDIR says.
+ansible_tmp=$(mktemp -d /tmp/zr7-ansible.XXXXXX)
 if [ "${KEEP:-0}" = 1 ]; then
     echo "test-ansible: scratch directory $work"
+    trap 'rm -rf "$ansible_tmp"' EXIT
 else
-    trap 'rm -rf "$work"' EXIT
+    trap 'rm -rf "$work" "$ansible_tmp"' EXIT
 fi
 
 # One image for every server; srv3's kmsenv names an architecture that would
@@ -42,34 +46,36 @@ done
 sed -i 's/^HUB01|BINARCH|lx8266|$/HUB01|BINARCH|..\/lx8266|/' "$work/srv3/config/.ConfigData/kmsenv"
 grep -q 'BINARCH|\.\./lx8266|' "$work/srv3/config/.ConfigData/kmsenv"
 
-{
-    echo "zr7_servers:"
-    echo "  vars:"
-    echo "    ansible_connection: local"
-    echo "    ansible_python_interpreter: \"{{ ansible_playbook_python }}\""
-    echo "    zr7inst_image: $work/image"
-    echo "    zr7_work: $work"
-    echo "    zr7_tree: $here/tree.py"
-    echo "  hosts:"
-    for host in "${hosts[@]}"; do
-        echo "    $host:"
-        echo "      zr7inst_home: $work/$host"
-        [ "$host" = srv3 ] && echo "      zr7_broken: true"
-    done
-} >"$work/hosts.yml"
+# The inventory, written as JSON so that any scratch path is taken as it is.
+"$python" - "$work" "$here/tree.py" "${hosts[@]}" >"$work/hosts.json" <<'PY'
+import json, sys
+work, tree, hosts = sys.argv[1], sys.argv[2], sys.argv[3:]
+group = {
+    "vars": {
+        "ansible_connection": "local",
+        "ansible_python_interpreter": "{{ ansible_playbook_python }}",
+        "zr7inst_image": work + "/image",
+        "zr7_work": work,
+        "zr7_tree": tree,
+    },
+    "hosts": {host: {"zr7inst_home": work + "/" + host} for host in hosts},
+}
+group["hosts"]["srv3"]["zr7_broken"] = True
+json.dump({"zr7_servers": group}, sys.stdout, indent=2)
+PY
 
 # Nothing of the machine's own Ansible set-up takes part.
 export ANSIBLE_CONFIG=$here/ansible.cfg
 export ANSIBLE_LIBRARY=$contrib/roles/zr7inst/library
 export ANSIBLE_ROLES_PATH=$contrib/roles
-export ANSIBLE_LOCAL_TEMP=$work/.ansible/local
-export ANSIBLE_REMOTE_TEMP=$work/.ansible/remote
+export ANSIBLE_LOCAL_TEMP=$ansible_tmp/local
+export ANSIBLE_REMOTE_TEMP=$ansible_tmp/remote
 export ANSIBLE_NOCOLOR=1
 unset MARLIN_HOME MARLINHOME VXA_TRC1
 
 playbook() {
     echo "===== ansible-playbook $*"
-    ansible-playbook -i "$work/hosts.yml" "$@"
+    ansible-playbook -i "$work/hosts.json" "$@"
 }
 
 started=$(date +%s)
