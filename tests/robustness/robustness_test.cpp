@@ -47,6 +47,7 @@ struct Launch {
     long long limit = -1;              // RLIMIT_FSIZE in bytes, SIGXFSZ ignored
     bool as_nobody = false;            // setgid and setuid 65534 before exec
     std::string cwd = "";
+    bool image = true;  // the image last (an undo has none)
 };
 
 // Starts the tool with standard output and error on `fd`, in a process group
@@ -57,7 +58,8 @@ pid_t start(const SampleInstall& s, const Launch& l, int fd) {
     std::vector<std::string> args{bin + "/zr7inst", "-o", s.home + "/logs/", "-h", s.home};
     args.erase(args.begin() + 1, args.begin() + (l.relaunch ? 3 : 1));
     args.insert(args.end(), l.options.begin(), l.options.end());
-    args.push_back(s.image);
+    if (l.image)
+        args.push_back(s.image);
     std::vector<char*> argv(args.size() + 1, nullptr);
     std::transform(args.begin(), args.end(), argv.begin(), [](auto& a) { return a.data(); });
     for (const char* name : {"MARLIN_HOME", "MARLINHOME", "QDSLOAD_FAIL", "QDSLOAD_RECORD"})
@@ -524,6 +526,66 @@ TEST(Kills, VxaenvIsAlwaysOldOrNewAndEveryBackupWhole) {
     }
     std::printf("[ figures  ] ZR7_SEED=%u: %d kills, %d after the change, %zu backups\n", seed,
                 kills, after_change, seen.size());
+}
+
+// The server's files as undo must give them back: names, bytes, modes and
+// owners, without the records, logs, backups and the loader's catalog.
+std::string server_files(const std::string& home) {
+    std::string text;
+    std::vector<std::string> lines;
+    for (const auto& e : std::filesystem::recursive_directory_iterator(home)) {
+        const std::string path = e.path().string();
+        if (zr7test::is_run_record(path) || path.find("/logs/") != std::string::npos ||
+            path.find("/.archive") != std::string::npos ||
+            path.find("qdsload.catalog") != std::string::npos) {
+            continue;
+        }
+        struct stat st {};
+        ::lstat(path.c_str(), &st);
+        lines.push_back(path + " " + std::to_string(st.st_mode) + " " + std::to_string(st.st_uid) +
+                        " " + (S_ISREG(st.st_mode) ? read_file(path) : ""));
+    }
+    std::sort(lines.begin(), lines.end());
+    for (const auto& line : lines)
+        text += line + "\n";
+    return text;
+}
+
+// An undo killed at any moment, then run again, gives the installation back
+// whole: every step of it can be taken a second time.
+TEST(Kills, AnUndoKilledAtAnyMomentCompletesWhenRunAgain) {
+    const unsigned seed =
+        unsigned(std::atoi(std::getenv("ZR7_SEED") ? std::getenv("ZR7_SEED") : "14"));
+    std::mt19937 random(seed);
+    const Launch undo{{"-u"}, false, -1, false, "", false};
+    long long length_us = 0;
+    const int kills = scaled(8, 100);
+    for (int k = 0; k <= kills; ++k) {
+        SampleInstall s;
+        write_file(s.tables() + "/table.dat", "the server's\n", 0600);
+        const std::string before = server_files(s.home);
+        ASSERT_EQ(run_tool(s, {{"-m", "kzr", "-c", "K=v"}}).exit_code, 0);
+        if (k == 0) {  // the first undo runs whole and gives the time an undo takes
+            const auto began = std::chrono::steady_clock::now();
+            ASSERT_EQ(run_tool(s, undo).exit_code, 0);
+            length_us = std::chrono::duration_cast<std::chrono::microseconds>(
+                            std::chrono::steady_clock::now() - began)
+                            .count();
+        } else {
+            const int out =
+                ::open((s.root / "undo.out").c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0644);
+            const pid_t pid = start(s, undo, out);
+            ::close(out);
+            std::this_thread::sleep_for(std::chrono::microseconds(
+                std::uniform_int_distribution<long long>(0, length_us)(random)));
+            ::kill(-pid, SIGKILL);
+            wait_for(pid);
+            const zr7test::RunResult again = run_tool(s, undo);
+            // The killed undo may have finished, or never begun.
+            ASSERT_TRUE(again.exit_code == 0 || again.exit_code == 256 - 12) << again.out;
+        }
+        EXPECT_EQ(server_files(s.home), before) << "kill " << k;
+    }
 }
 
 // Eight runs at once take turns at VXAENV: one whole backup each, no change lost.
