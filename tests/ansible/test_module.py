@@ -10,9 +10,9 @@ import unittest
 
 LIBRARY = os.path.join(os.path.dirname(os.path.abspath(__file__)), "..", "..", "contrib", "ansible",
                        "roles", "zr7inst", "library", "zr7inst.py")
-spec = importlib.util.spec_from_file_location("zr7inst_module", LIBRARY)
-m = importlib.util.module_from_spec(spec)
-spec.loader.exec_module(m)
+found = importlib.util.spec_from_file_location("zr7inst_module", LIBRARY)
+m = importlib.util.module_from_spec(found)
+found.loader.exec_module(m)
 
 
 def params(**given):
