@@ -17,7 +17,7 @@ FORMAT_FILES = $(sort $(shell find qsd tests fuzz tools bench -name '*.cpp' -o -
 SANITIZER_OPTIONS = ASAN_OPTIONS=detect_leaks=1:abort_on_error=0 \
 	UBSAN_OPTIONS=print_stacktrace=1:halt_on_error=1
 
-.PHONY: all build test soak fuzz memcheck demo bench format format-check tidy clean
+.PHONY: all build test test-ansible soak fuzz memcheck demo bench format format-check tidy clean
 
 all: build
 
@@ -36,6 +36,15 @@ test:
 		-DZR7_BENCH=ON $(WERROR_DEV)
 	cmake --build $(BUILD_TEST) -j $(JOBS)
 	$(SANITIZER_OPTIONS) ctest --test-dir $(BUILD_TEST) --output-on-failure -j $(JOBS)
+
+# The Ansible module and role of contrib/ansible across five local servers
+# (tests/ansible/run.sh), driving the optimised tool and the stand-in loader:
+# the module's unit tests, then the playbooks. Needs ansible-playbook
+# (Debian's ansible-core).
+test-ansible: build
+	ansible_python=$$(sed -n '1s/^#! *\([^ ]*\).*/\1/p' "$$(command -v ansible-playbook)"); \
+	"$${ansible_python:-python3}" -m unittest discover -s tests/ansible -p 'test_*.py'
+	PATH="$(CURDIR)/$(BUILD_REL)/bin:$$PATH" tests/ansible/run.sh
 
 # The robustness tests in their long variants (every kill, the whole wide
 # directory), run straight from the test program: they outlast a ctest time
