@@ -38,13 +38,13 @@ test:
 	$(SANITIZER_OPTIONS) ctest --test-dir $(BUILD_TEST) --output-on-failure -j $(JOBS)
 
 # The Ansible module and role of contrib/ansible across five local servers
-# (tests/ansible/run.sh), driving the optimised tool and the stand-in loader:
+# (contrib/ansible/tests/run.sh), driving the optimised tool and the stand-in loader:
 # the module's unit tests, then the playbooks. Needs ansible-playbook
 # (Debian's ansible-core).
 test-ansible: build
 	ansible_python=$$(sed -n '1s/^#! *\([^ ]*\).*/\1/p' "$$(command -v ansible-playbook)"); \
-	"$${ansible_python:-python3}" -m unittest discover -s tests/ansible -p 'test_*.py'
-	PATH="$(CURDIR)/$(BUILD_REL)/bin:$$PATH" tests/ansible/run.sh
+	"$${ansible_python:-python3}" -m unittest discover -s contrib/ansible/tests -p 'test_*.py'
+	PATH="$(CURDIR)/$(BUILD_REL)/bin:$$PATH" contrib/ansible/tests/run.sh
 
 # The robustness tests in their long variants (every kill, the whole wide
 # directory), run straight from the test program: they outlast a ctest time

@@ -1,14 +1,14 @@
 """The zr7inst module's pure parts: the argument vector built from a task's
 parameters, the reading of a plan and of the records, and what counts as a
 change. Run with the Python that runs Ansible:
-    python3 -m unittest discover -s tests/ansible -p 'test_*.py'"""
+    python3 -m unittest discover -s contrib/ansible/tests -p 'test_*.py'"""
 
 import importlib.util
 import json
 import os
 import unittest
 
-LIBRARY = os.path.join(os.path.dirname(os.path.abspath(__file__)), "..", "..", "contrib", "ansible",
+LIBRARY = os.path.join(os.path.dirname(os.path.abspath(__file__)), "..",
                        "roles", "zr7inst", "library", "zr7inst.py")
 found = importlib.util.spec_from_file_location("zr7inst_module", LIBRARY)
 m = importlib.util.module_from_spec(found)

@@ -10,7 +10,7 @@
 set -euo pipefail
 
 here=$(cd "$(dirname "$0")" && pwd)
-repo=$(cd "$here/../.." && pwd)
+repo=$(cd "$here/../../.." && pwd)
 contrib=$repo/contrib/ansible
 
 for program in zr7inst qdsload ansible-playbook; do
@@ -84,7 +84,7 @@ ansible-doc -t module zr7inst >/dev/null
 if command -v ansible-lint >/dev/null 2>&1; then
     echo "===== ansible-lint"
     (cd "$repo" && ansible-lint --offline -p contrib/ansible/rollout.yml contrib/ansible/undo.yml \
-        contrib/ansible/roles/zr7inst tests/ansible/fleet.yml tests/ansible/expect.yml)
+        contrib/ansible/roles/zr7inst contrib/ansible/tests/fleet.yml contrib/ansible/tests/expect.yml)
 else
     echo "===== ansible-lint is not installed: the role and playbooks are not linted"
 fi
