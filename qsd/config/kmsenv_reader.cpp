@@ -1,5 +1,7 @@
 #include "qsd/config/kmsenv_reader.h"
 
+#include "qsd/text/escape.h"
+
 namespace zr7 {
 
 namespace {
@@ -83,6 +85,16 @@ KmsenvResult read_kmsenv(const std::string& content, const ServerConfig& start) 
     }
     c.family_setting = family_setting_for(c.port, c.protocol);
     return result;
+}
+
+bool is_safe_directory_name(const std::string& name) {
+    if (name == "." || name == "..")
+        return false;
+    for (char c : name) {
+        if (c == '/' || is_control_byte(c))
+            return false;
+    }
+    return true;
 }
 
 }  // namespace zr7

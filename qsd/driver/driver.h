@@ -59,6 +59,7 @@ struct RunRecord {
     std::string backup;    // the environment file's backup, "" for none
     StringList errors;     // the "Error:" lines
     std::string manifest;  // "" for none
+    std::string undoes;    // an undo's: the run it took back, "" for none
 };
 // The record as one JSON object on one line, without the line break.
 std::string run_record_json(const RunRecord& record);

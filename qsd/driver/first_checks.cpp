@@ -6,6 +6,7 @@
 #include <cstdio>
 
 #include "qsd/driver/driver.h"
+#include "qsd/platform/status.h"
 #include "qsd/text/escape.h"
 
 namespace zr7 {
@@ -34,13 +35,13 @@ int check_before_relaunch(const std::string& home, const std::string& src_dir,
     const std::string logs = log_dir_for(home);
     if (!is_directory(home)) {
         line = "Error: Installation directory <" + home + "> does not exist";
-        status = -7;
+        status = zr7::kStatusCannotOpen;
     } else if (!src_dir.empty() && !is_directory(msrv)) {
         line = "Error: Can't open <" + msrv + ">";
-        status = -7;
+        status = zr7::kStatusCannotOpen;
     } else if (!is_directory(logs)) {
         line = "Error: Log directory <" + logs + "> does not exist";
-        status = -8;
+        status = zr7::kStatusCannotWrite;
     }
     if (status != 0) {
         std::fflush(stdout);

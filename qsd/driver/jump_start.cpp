@@ -15,6 +15,7 @@
 #include "qsd/fileops/install_util.h"
 #include "qsd/platform/fs.h"
 #include "qsd/platform/process.h"
+#include "qsd/platform/status.h"
 #include "qsd/platform/trace.h"
 #include "qsd/text/escape.h"
 
@@ -91,7 +92,7 @@ int jump_start(int argc, char** argv, const char* home) {
     if (const int error = open_log(home, log_fd)) {
         std::fprintf(stderr, "Error: Can't open <%s>\n", shown_log.c_str());
         std::fprintf(stderr, "Error: <%s>: %s\n", shown_log.c_str(), fs::error_text(error).c_str());
-        return -8;
+        return zr7::kStatusCannotWrite;
     }
     ProcessSpec job;
     job.program = own_program(argv[0]);

@@ -11,6 +11,7 @@
 #include "qsd/driver/getopt.h"
 #include "qsd/installer/installer610.h"
 #include "qsd/platform/interruption.h"
+#include "qsd/platform/status.h"
 #include "qsd/platform/trace.h"
 #include "qsd/text/escape.h"
 
@@ -223,6 +224,7 @@ int run_main(int argc, char** argv) {
     record.home = absolute(home);
     record.image = undo ? "" : absolute(src_dir);
     record.backup = progress.state().backup;
+    record.undoes = installer.undone_run;
     status = keep_run_record(installer, record, status);
     trace_collect_errors(nullptr);
     progress.finish(status, installer.plan.summary().substr(9), log_file, seconds_since(started));
@@ -233,7 +235,7 @@ int run_main(int argc, char** argv) {
     if (std::ferror(stdout) != 0) {
         std::fprintf(stderr, "Error: Can't write <%s>\n", escape_controls(log_file).c_str());
         if (status == 0)
-            status = -8;
+            status = zr7::kStatusCannotWrite;
     }
     ZR7_DETAIL("%s", run_closing_line(status, progress.state(), seconds_since(started),
                                       installer.journal ? installer.journal->seconds() : 0.0)

@@ -7,6 +7,7 @@
 #include "qsd/installer/installer610.h"
 #include "qsd/installer/run_store.h"
 #include "qsd/platform/fs.h"
+#include "qsd/platform/status.h"
 #include "qsd/text/escape.h"
 
 namespace zr7 {
@@ -39,7 +40,7 @@ int keep_run_record(Installer610& installer, RunRecord& record, int status) {
     record.run = installer.run_id;
     const std::string manifest = store_path + "/" + record.run + "/manifest";
     const std::string failed = error == 0 ? manifest : store_path;
-    if (error == -8)
+    if (error == zr7::kStatusCannotWrite)
         error = EIO;  // begin_run_dir wrote why
     if (error == 0) {
         error = write_run_file(installer.run_dir.get(), "manifest",
@@ -48,7 +49,7 @@ int keep_run_record(Installer610& installer, RunRecord& record, int status) {
     if (error != 0) {
         report(failed, error);
         if (status == 0)
-            status = -8;
+            status = zr7::kStatusCannotWrite;
     } else {
         record.manifest = manifest;
     }
@@ -69,7 +70,7 @@ int keep_run_record(Installer610& installer, RunRecord& record, int status) {
     if (error != 0) {
         report(absolute(installer, dir) + "qsdinst.json", error);
         if (status == 0)
-            status = -8;
+            status = zr7::kStatusCannotWrite;
     }
     return status;
 }

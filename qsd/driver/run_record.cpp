@@ -65,6 +65,12 @@ std::string run_record_json(const RunRecord& record) {
     else
         json.add("backup", record.backup);
     json.add("errors", record.errors);
+    if (record.operation == "undo") {
+        if (record.undoes.empty())
+            json.add_null("undoes");
+        else
+            json.add("undoes", record.undoes);
+    }
     if (record.manifest.empty())
         json.add_null("manifest");
     else

@@ -2,6 +2,7 @@
 #include <cstdlib>
 
 #include "qsd/driver/driver.h"
+#include "qsd/platform/status.h"
 
 namespace zr7 {
 
@@ -46,7 +47,7 @@ std::string usage_text() {
 void usage() {
     std::fflush(stdout);
     std::fputs(usage_text().c_str(), stderr);
-    std::exit(-2);
+    std::exit(zr7::kStatusUsage);
 }
 
 }  // namespace zr7

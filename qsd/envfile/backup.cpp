@@ -1,4 +1,5 @@
 #include "qsd/envfile/backup.h"
+#include "qsd/platform/status.h"
 
 #include <sys/stat.h>
 
@@ -42,7 +43,7 @@ int backup_content_at(int base_fd, const std::string& base_shown, const std::str
     if (const int error = fs::make_dir(base_fd, ".archive", archive_fd)) {
         ZR7_ERROR("Error: Unable to create backup directory <%s>", archive.c_str());
         ZR7_ERROR("Error: <%s>: %s", archive.c_str(), fs::error_text(error).c_str());
-        ZR7_RETURN(-9);
+        ZR7_RETURN(zr7::kStatusBackupFailed);
     }
 
     fs::remove_stale_scratch(archive_fd.get(), file + ".backup");
@@ -74,7 +75,7 @@ int backup_content_at(int base_fd, const std::string& base_shown, const std::str
         ZR7_ERROR("Error: Can't back up <%s> to <%s>", join(base_shown, file).c_str(),
                   backup.c_str());
         ZR7_ERROR("Error: <%s>: %s", backup.c_str(), fs::error_text(error).c_str());
-        ZR7_RETURN(-9);
+        ZR7_RETURN(zr7::kStatusBackupFailed);
     }
     ZR7_DETAIL("File <%s> is backed up as <%s> successfully", join(base_shown, file).c_str(),
                backup.c_str());
@@ -103,7 +104,7 @@ int backup_file(const char* dir, const char* file, const char* base, unsigned st
                 std::string& made) {
     made.clear();
     if (dir == nullptr || file == nullptr || base == nullptr)
-        return -9;
+        return zr7::kStatusBackupFailed;
     fs::UniqueFd dir_fd;
     fs::UniqueFd base_fd;
     fs::UniqueFd source;
@@ -112,7 +113,7 @@ int backup_file(const char* dir, const char* file, const char* base, unsigned st
     if (fs::open_trusted_dir(dir, dir_fd) != 0 || fs::open_trusted_dir(base, base_fd) != 0 ||
         fs::open_read(dir_fd.get(), file, source, st) != 0 ||
         fs::read_all(source.get(), content) != 0) {
-        return -9;
+        return zr7::kStatusBackupFailed;
     }
     return backup_content_at(base_fd.get(), base, file, content, st.st_mode, stamp, made);
 }

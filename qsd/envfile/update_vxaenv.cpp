@@ -12,10 +12,12 @@
 
 #include "qsd/envfile/backup.h"
 #include "qsd/envfile/env_rewrite.h"
+#include "qsd/envfile/kds_run_list.h"
 #include "qsd/fileops/install_util.h"
 #include "qsd/installer/installer610.h"
 #include "qsd/platform/directory_lock.h"
 #include "qsd/platform/fs.h"
+#include "qsd/platform/status.h"
 #include "qsd/platform/trace.h"
 
 namespace {
@@ -72,7 +74,7 @@ int Installer610::update_vxaenv(const std::string& dir_template) {
     if (error != 0) {
         ZR7_ERROR("Error: Can't open <%s>", env_path.c_str());
         ZR7_ERROR("Error: <%s>: %s", env_path.c_str(), zr7::fs::error_text(error).c_str());
-        ZR7_RETURN(-7);
+        ZR7_RETURN(zr7::kStatusCannotOpen);
     }
     ZR7_DETAIL("writing to <%s>", (join_dir(dir, ".VXAENV.new.") + "XXXXXX").c_str());
 
@@ -83,7 +85,7 @@ int Installer610::update_vxaenv(const std::string& dir_template) {
         ZR7_RETURN(lock.failure());
     if (!lock.locked()) {
         ZR7_ERROR("Error: Can't open <%s>", env_path.c_str());
-        ZR7_RETURN(-7);
+        ZR7_RETURN(zr7::kStatusCannotOpen);
     }
 
     // Scratch files of a run that was killed here; the locks keep live runs out.
@@ -98,7 +100,7 @@ int Installer610::update_vxaenv(const std::string& dir_template) {
     if (error != 0) {
         ZR7_ERROR("Error: Can't open <%s>", env_path.c_str());
         ZR7_ERROR("Error: <%s>: %s", env_path.c_str(), zr7::fs::error_text(error).c_str());
-        ZR7_RETURN(-7);
+        ZR7_RETURN(zr7::kStatusCannotOpen);
     }
 
     std::string new_content;
@@ -130,29 +132,29 @@ int Installer610::update_vxaenv(const std::string& dir_template) {
     if (error != 0) {
         ZR7_ERROR("Error: Can't open <%s>", new_path.c_str());
         ZR7_ERROR("Error: <%s>: %s", new_path.c_str(), zr7::fs::error_text(error).c_str());
-        status = -8;
+        status = zr7::kStatusCannotWrite;
     } else if ((error = zr7::fs::write_all(replace.fd(), new_content)) != 0 ||
                (error = replace.adopt_attributes()) != 0 || (error = replace.sync_scratch()) != 0) {
         ZR7_ERROR("Error: Can't write <%s>", new_path.c_str());
         ZR7_ERROR("Error: <%s>: %s", new_path.c_str(), zr7::fs::error_text(error).c_str());
-        status = -8;
+        status = zr7::kStatusCannotWrite;
     } else if (zr7::backup_content_at(dir_fd.get(), dir, "VXAENV", content, old.st_mode,
                                       zr7::backup_stamp(std::time(nullptr)), backup) != 0) {
         ZR7_ERROR("Error: Can't backup VXAENV");
-        status = -9;
+        status = zr7::kStatusBackupFailed;
     } else if (journal_or_null() != nullptr &&
                ((error = journal->note("backup", backup)) != 0 ||
                 (error = journal->before_write(target.dir.get(), target.name, env_path,
                                                zr7::Action::kReplace)) != 0)) {
         ZR7_ERROR("Error: Can't keep the old version of <%s>", env_path.c_str());
         ZR7_ERROR("Error: <%s>: %s", env_path.c_str(), zr7::fs::error_text(error).c_str());
-        status = -9;
+        status = zr7::kStatusBackupFailed;
     } else {
         on_action(zr7::Action::kBackup, backup, "");
         if ((error = replace.commit()) != 0) {
             ZR7_ERROR("Error: Can't copy <%s> to <%s>", new_path.c_str(), env_path.c_str());
             ZR7_ERROR("Error: <%s>: %s", env_path.c_str(), zr7::fs::error_text(error).c_str());
-            status = -5;
+            status = zr7::kStatusCopyFailed;
         } else {
             if (journal_or_null() != nullptr)
                 (void)journal->after_write(target.dir.get(), target.name, env_path);
@@ -163,4 +165,14 @@ int Installer610::update_vxaenv(const std::string& dir_template) {
     if (observer != nullptr && status == 0)
         observer->on_env_result(true);
     ZR7_RETURN(status);
+}
+
+// The traced face of the module run list; the rules live in kds_run_list.cpp.
+int Installer610::update_kds_run(const std::string& line, std::string& out) const {
+    ZR7_OPERATION("Installer610::update_kds_run");
+    zr7::KdsRunUpdate update = zr7::update_kds_run_line(line, module_name);
+    for (const std::string& detail : update.details)
+        ZR7_DETAIL("%s", detail.c_str());
+    out = update.line;
+    ZR7_RETURN(update.result);
 }

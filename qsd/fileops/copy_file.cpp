@@ -5,9 +5,21 @@
 #include "qsd/fileops/install_util.h"
 #include "qsd/platform/fs.h"
 #include "qsd/platform/process.h"
+#include "qsd/platform/status.h"
 #include "qsd/platform/trace.h"
 
 namespace zr7 {
+
+unsigned copy_flags_from_options(const std::string& options) {
+    unsigned flags = 0;
+    for (char letter : options) {
+        if (letter == 'O')
+            flags |= kCopyOverwrite;
+        else if (letter == 'T')
+            flags |= kCopyFixCr;
+    }
+    return flags;
+}
 
 namespace {
 
@@ -63,10 +75,10 @@ int copy_file_at(int src_fd, const struct stat& src_st, const std::string& src_s
     int error = 0;
     if (status == 0 && (!S_ISREG(src_st.st_mode) || (dst_exists && S_ISDIR(dst_st.st_mode)))) {
         error = S_ISREG(src_st.st_mode) ? EISDIR : fs::kNotRegular;
-        status = -5;
+        status = zr7::kStatusCopyFailed;
     } else if (status == 0 && src_fd < 0) {
         error = EACCES;
-        status = -5;
+        status = zr7::kStatusCopyFailed;
     }
     if (status == 0) {
         fs::AtomicReplace replace(target.dir.get(), target.name, false);
@@ -107,7 +119,7 @@ std::string name_of(const std::string& path) {
 // taken as given, the names below them by the link rule.
 int InstallUtil::copy_file(const char* src, const char* dst, unsigned flags) {
     if (src == nullptr || dst == nullptr)
-        return -5;  // nothing names the file: no copy, and no line to trace
+        return zr7::kStatusCopyFailed;  // nothing names the file: no copy, and no line to trace
     zr7::fs::UniqueFd src_dir;
     zr7::fs::UniqueFd dst_dir;
     zr7::fs::UniqueFd file;
@@ -117,6 +129,6 @@ int InstallUtil::copy_file(const char* src, const char* dst, unsigned flags) {
         st = {};
     }
     if (zr7::fs::open_trusted_dir(dir_of(dst), dst_dir) != 0)
-        return -5;
+        return zr7::kStatusCopyFailed;
     return zr7::copy_file_at(file.get(), st, src, dst_dir.get(), name_of(dst), dst, flags);
 }

@@ -4,6 +4,7 @@
 #include "qsd/fileops/install_util.h"
 #include "qsd/fileops/tree_walk.h"
 #include "qsd/platform/fs.h"
+#include "qsd/platform/status.h"
 #include "qsd/platform/trace.h"
 
 // The names of the non-directory entries of one directory, in the order the
@@ -17,7 +18,7 @@ int InstallUtil::get_file_list(const char* dir, zr7::StringList& list) {
     zr7::StringList names;
     if (dir == nullptr || zr7::fs::open_trusted_dir(dir, fd) != 0 ||
         zr7::list_names(fd.get(), names) != 0) {
-        return -7;
+        return zr7::kStatusCannotOpen;
     }
     for (const std::string& name : names) {
         struct stat st {};
@@ -28,7 +29,7 @@ int InstallUtil::get_file_list(const char* dir, zr7::StringList& list) {
                 continue;
             }
             ZR7_ERROR("Error: Can't access <%s/%s>", dir, name.c_str());
-            return -7;
+            return zr7::kStatusCannotOpen;
         }
         if (S_ISDIR(st.st_mode))
             continue;

@@ -1,3 +1,4 @@
+// The small system helpers of InstallUtil: names and texts the runs use.
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -5,30 +6,6 @@
 #include <cstring>
 
 #include "qsd/fileops/install_util.h"
-#include "qsd/platform/trace.h"
-
-int InstallUtil::delete_file(const char* path) {
-    ZR7_TRACED("InstallUtil::delete_file");
-    if (path == nullptr)
-        return -1;
-    ZR7_DETAIL("deleting <%s>", path);
-    return ::unlink(path) == 0 ? 0 : -1;
-}
-
-int InstallUtil::mkdir(const char* path) {
-    return ::mkdir(path, 0766) == 0 ? 0 : -1;
-}
-
-int InstallUtil::removeReadOnly(const char* path) {
-    struct stat st {};
-    if (::stat(path, &st) != 0)
-        return 0;
-    // Most copies arrive writable already: their mode would not change, so
-    // the call that would set it again is left out.
-    if ((st.st_mode & S_IWUSR) == 0)
-        (void)::chmod(path, (st.st_mode & 07777) | S_IWUSR);
-    return 0;
-}
 
 std::string InstallUtil::quote_str(const char* text) {
     if (text == nullptr)

@@ -9,6 +9,16 @@
 constexpr unsigned kCopyOverwrite = 1;
 constexpr unsigned kCopyFixCr = 2;
 
+namespace zr7 {
+
+// The option letters of a tree-copy command as copy flags: each "O" asks for
+// overwrite, each "T" for carriage-return removal; letters may repeat and
+// stand in any order, every other byte (lower case included) is ignored, and
+// an empty text means neither.
+unsigned copy_flags_from_options(const std::string& options);
+
+}  // namespace zr7
+
 class InstallUtil {
   public:
     // key=value splitter: key before the first "=", value after it, both with
@@ -20,13 +30,10 @@ class InstallUtil {
     // The local host's name, "" when it cannot be had.
     static std::string get_hostname();
 
-    // File primitives. copy_file runs `cp` or `tr` through the process runner:
-    // 0 when copied (or skipped: destination present, overwrite off), -5 when
-    // the copy failed.
+    // copy_file runs `cp` or `tr` through the process runner: 0 when copied
+    // (or skipped: destination present, overwrite off), -5 when the copy
+    // failed.
     static int copy_file(const char* src, const char* dst, unsigned flags);
-    static int delete_file(const char* path);
-    static int mkdir(const char* path);
-    static int removeReadOnly(const char* path);
     // The text wrapped in double quotes when it holds white space. It only
     // builds the command texts that the trace shows; nothing is run through
     // a shell.
@@ -35,10 +42,6 @@ class InstallUtil {
     static std::string get_pid();
 
     // Flat and tree copies.
-    using EntryOperation = int (*)(const char* src, const char* dst, unsigned flags);
     static int get_file_list(const char* dir, zr7::StringList& list);
-    static int recursive_process(const char* src, const char* dst, EntryOperation operation,
-                                 unsigned flags);
-    static int copy(const char* src, const char* dst, unsigned flags);
     static int xcopy(const char* src, const char* dst, unsigned flags);
 };

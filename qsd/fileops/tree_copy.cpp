@@ -2,13 +2,13 @@
 // passes: copying, or changing nothing (the checks before the first change,
 // and the preview), so that the checks meet exactly what the copy meets.
 #include "qsd/fileops/copy_at.h"
-#include "qsd/fileops/copy_options.h"
 #include "qsd/fileops/copy_outcome.h"
 #include "qsd/fileops/install_util.h"
 #include "qsd/fileops/tree_walk.h"
 #include "qsd/installer/installer610.h"
 #include "qsd/platform/fs.h"
 #include "qsd/platform/interruption.h"
+#include "qsd/platform/status.h"
 #include "qsd/platform/trace.h"
 
 int Installer610::copy(const std::string& src_template, const std::string& dst_template) {
@@ -36,11 +36,11 @@ int Installer610::flat_copy(const std::string& src_template, const std::string& 
     }
     if (opened == zr7::kLeadsOutside) {
         ZR7_ERROR("Error: Link <%s> leads outside the image", src.c_str());
-        return -5;
+        return zr7::kStatusCopyFailed;
     }
     if (opened != 0 || zr7::list_names(dir.fd.get(), names) != 0) {
         ZR7_ERROR("Error: Can't open <%s>", src.c_str());
-        return -7;
+        return zr7::kStatusCannotOpen;
     }
 
     // Only the files directly in the source; the destination must exist (or,
@@ -63,12 +63,12 @@ int Installer610::flat_copy(const std::string& src_template, const std::string& 
         }
         if (found == zr7::kLeadsOutside) {
             ZR7_ERROR("Error: Link <%s> leads outside the image", from.c_str());
-            return -5;
+            return zr7::kStatusCopyFailed;
         }
         if (found != 0) {
             ZR7_ERROR("Error: Can't access <%s>", from.c_str());
             ZR7_ERROR("Error: <%s>: %s", from.c_str(), zr7::fs::error_text(found).c_str());
-            return -7;
+            return zr7::kStatusCannotOpen;
         }
         if (!dst_opened) {
             int error = open_in_home(dst, dst_dir);
@@ -77,7 +77,7 @@ int Installer610::flat_copy(const std::string& src_template, const std::string& 
             if (error != 0) {
                 ZR7_ERROR("Error: Can't open <%s>", dst.c_str());
                 ZR7_ERROR("Error: <%s>: %s", dst.c_str(), zr7::fs::error_text(error).c_str());
-                return -5;
+                return zr7::kStatusCopyFailed;
             }
             dst_opened = true;
             if (!check_only) {
@@ -131,7 +131,7 @@ int Installer610::tree_copy(const std::string& src_template, const std::string& 
         ZR7_ERROR(opened == zr7::kLeadsOutside ? "Error: Link <%s> leads outside the image"
                                                : "Error: Can't open <%s>",
                   src.c_str());
-        return -5;
+        return zr7::kStatusCopyFailed;
     }
 
     // The top destination is not created here: it must exist when there is
@@ -143,7 +143,7 @@ int Installer610::tree_copy(const std::string& src_template, const std::string& 
     if (const int error = open_in_home(dst, dst_dir)) {
         ZR7_ERROR("Error: Can't open <%s>", dst.c_str());
         ZR7_ERROR("Error: <%s>: %s", dst.c_str(), zr7::fs::error_text(error).c_str());
-        return -5;
+        return zr7::kStatusCopyFailed;
     }
     if (!check_only)
         note_written(dst_dir.get());
@@ -155,5 +155,7 @@ int Installer610::tree_copy(const std::string& src_template, const std::string& 
     const int status =
         zr7::copy_tree(image, top, src, dst_dir.get(), dst + "/",
                        zr7::copy_flags_from_options(options), server_dir_guard(), pass);
-    return status == 0 || status == -9 || status == zr7::kStatusInterrupted ? status : -5;
+    return status == 0 || status == zr7::kStatusBackupFailed || status == zr7::kStatusInterrupted
+               ? status
+               : -5;
 }

@@ -1,4 +1,5 @@
 #include "qsd/fileops/tree_walk.h"
+#include "qsd/platform/status.h"
 
 #include <dirent.h>
 #include <fcntl.h>
@@ -9,7 +10,6 @@
 #include <utility>
 
 #include "qsd/fileops/copy_at.h"
-#include "qsd/fileops/copy_options.h"
 #include "qsd/fileops/install_util.h"
 #include "qsd/platform/fs.h"
 #include "qsd/platform/interruption.h"
@@ -47,7 +47,7 @@ int journaled_copy(ChangeJournal* journal, Action action, const ImageEntry& entr
         if (const int error = journal->before_write(dst_dir, name, dst_shown, action)) {
             ZR7_ERROR("Error: Can't keep the old version of <%s>", dst_shown.c_str());
             ZR7_ERROR("Error: <%s>: %s", dst_shown.c_str(), fs::error_text(error).c_str());
-            return -5;
+            return zr7::kStatusCopyFailed;
         }
     }
     const int status =
@@ -86,7 +86,7 @@ int walk(Walk& w, const ImageEntry& src, const std::string& src_shown, int dst_d
     if (const int error = list_names(src.fd.get(), names)) {
         ZR7_ERROR("Error: Can't open <%s>", src_shown.c_str());
         ZR7_ERROR("Error: <%s>: %s", src_shown.c_str(), fs::error_text(error).c_str());
-        ZR7_RETURN(-7);
+        ZR7_RETURN(zr7::kStatusCannotOpen);
     }
     const bool server_dir = dst_dir >= 0 && is_server_dir(w.guard, dst_dir);
     // Scratch files of a run that was killed; the run lock keeps live runs out.
@@ -106,21 +106,21 @@ int walk(Walk& w, const ImageEntry& src, const std::string& src_shown, int dst_d
             continue;
         if (opened == kLeadsOutside) {
             ZR7_ERROR("Error: Link <%s> leads outside the image", src_path.c_str());
-            ZR7_RETURN(-5);
+            ZR7_RETURN(zr7::kStatusCopyFailed);
         }
         if (opened != 0) {
             ZR7_ERROR("Error: Can't access <%s>", src_path.c_str());
             ZR7_ERROR("Error: <%s>: %s", src_path.c_str(), fs::error_text(opened).c_str());
-            ZR7_RETURN(-7);
+            ZR7_RETURN(zr7::kStatusCannotOpen);
         }
         if (server_dir && name == ".archive") {
             ZR7_ERROR("Error: The image may not write into <%s>", dst_path.c_str());
-            ZR7_RETURN(-5);
+            ZR7_RETURN(zr7::kStatusCopyFailed);
         }
         if (entry.kind == EntryKind::kDirectory) {
             if (!w.walked.insert({entry.st.st_dev, entry.st.st_ino}).second) {
                 ZR7_ERROR("Error: Directory loop at <%s>", src_path.c_str());
-                ZR7_RETURN(-5);
+                ZR7_RETURN(zr7::kStatusCopyFailed);
             }
             fs::UniqueFd sub;
             int error = 0;
@@ -200,7 +200,7 @@ int check_copy_at(int src_fd, const struct stat& src_st, const std::string& src_
         return 0;
     ZR7_ERROR("Error: <%s>: %s", (error == EISDIR ? dst_shown : src_shown).c_str(),
               fs::error_text(error).c_str());
-    return -5;
+    return zr7::kStatusCopyFailed;
 }
 
 int copy_tree(const ImageRoot& root, const ImageEntry& src, const std::string& src_shown,
@@ -216,13 +216,13 @@ int copy_tree(const ImageRoot& root, const ImageEntry& src, const std::string& s
 // The tree copy between two paths that the caller names, taken as given.
 int InstallUtil::xcopy(const char* src, const char* dst, unsigned flags) {
     if (src == nullptr || dst == nullptr)
-        return -5;
+        return zr7::kStatusCopyFailed;
     zr7::ImageRoot root;
     zr7::ImageEntry top;
     zr7::fs::UniqueFd dst_dir;
     if (zr7::open_image_root(src, root) != 0 || zr7::open_image_dir(root, "", top) != 0 ||
         zr7::fs::open_trusted_dir(dst, dst_dir) != 0) {
-        return -5;
+        return zr7::kStatusCopyFailed;
     }
     std::string shown = dst;
     if (shown.empty() || shown.back() != '/')

@@ -4,7 +4,8 @@
 #include <cstdio>
 #include <memory>
 
-#include "qsd/config/names.h"
+#include "qsd/config/kmsenv_reader.h"
+#include "qsd/platform/status.h"
 
 #include "qsd/fileops/install_util.h"
 #include "qsd/installer/installer610.h"
@@ -147,7 +148,7 @@ int Installer610::begin_run_dir(bool with_journal) {
     if (error != 0) {
         ZR7_ERROR("Error: Can't keep the record of the run in <%s>", store_path.c_str());
         ZR7_ERROR("Error: <%s>: %s", store_path.c_str(), zr7::fs::error_text(error).c_str());
-        return -8;
+        return zr7::kStatusCannotWrite;
     }
     return 0;
 }

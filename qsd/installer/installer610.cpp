@@ -27,16 +27,6 @@ int Installer610::addVar(const char* text) {
     ZR7_RETURN(0);
 }
 
-int Installer610::find_symbol(const char* name, std::string& value) const {
-    if (name == nullptr)
-        return -1;
-    const std::string* found = symbols.find(name);
-    if (found == nullptr)
-        return -1;
-    value = *found;
-    return 0;
-}
-
 int Installer610::add_symbol(const char* name, const char* value) {
     if (name == nullptr || value == nullptr)
         return -1;

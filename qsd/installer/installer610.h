@@ -27,7 +27,6 @@ class Installer610 : public zr7::ActionSink {
 
     // Settings and symbols.
     int addVar(const char* text);
-    int find_symbol(const char* name, std::string& value) const;
     int add_symbol(const char* name, const char* value);
     int add_path_symbol(const char* name, const char* value);
     int resolve(const std::string& path_template, std::string& out) const;
@@ -144,4 +143,5 @@ class Installer610 : public zr7::ActionSink {
     zr7::fs::UniqueFd run_dir;              // this run's directory in the run store
     std::string run_id;                     // its name
     std::unique_ptr<zr7::Journal> journal;  // an installing run's
+    std::string undone_run;                 // the run an undo took back
 };

@@ -8,8 +8,9 @@
 #include "qsd/installer/installer610.h"
 #include "qsd/platform/fs.h"
 #include "qsd/platform/process.h"
+#include "qsd/platform/status.h"
 #include "qsd/platform/trace.h"
-#include "qsd/seeding/sql_selection.h"
+#include "qsd/seeding/seed_texts.h"
 
 namespace {
 
@@ -44,7 +45,7 @@ int Installer610::check_architecture() {
     if (!has_trees)
         return 0;
     ZR7_ERROR("Error: The image has no tree for the architecture <%s>", arch.c_str());
-    return -7;
+    return zr7::kStatusCannotOpen;
 }
 
 int Installer610::check_env_file(const SimpleCommand& command) {
@@ -72,7 +73,7 @@ int Installer610::check_env_file(const SimpleCommand& command) {
     if (error != 0) {
         ZR7_ERROR("Error: Can't open <%s>", env_path.c_str());
         ZR7_ERROR("Error: <%s>: %s", env_path.c_str(), zr7::fs::error_text(error).c_str());
-        return -7;
+        return zr7::kStatusCannotOpen;
     }
     if (!preview)
         return 0;
@@ -84,7 +85,7 @@ int Installer610::check_env_file(const SimpleCommand& command) {
     if (error != 0) {
         ZR7_ERROR("Error: Can't open <%s>", env_path.c_str());
         ZR7_ERROR("Error: <%s>: %s", env_path.c_str(), zr7::fs::error_text(error).c_str());
-        return -7;
+        return zr7::kStatusCannotOpen;
     }
     zr7::Dictionary requested = settings;
     const zr7::EnvRewrite rewrite = zr7::rewrite_env_content(content, requested, module_name);
@@ -105,7 +106,7 @@ int Installer610::check_seed(const SimpleCommand& command) {
     zr7::StringList names;
     if (InstallUtil::get_file_list(src.c_str(), names) != 0) {
         ZR7_ERROR("Error: Can't open <%s>", src.c_str());
-        return -7;
+        return zr7::kStatusCannotOpen;
     }
     bool loader_found = false;
     for (const std::string& name : names) {
@@ -114,14 +115,14 @@ int Installer610::check_seed(const SimpleCommand& command) {
             if (zr7::find_on_path("qdsload").empty()) {
                 ZR7_ERROR("Error: Can't start <qdsload>: not found on PATH");
                 ZR7_ERROR("Error: Seeding <%s> failed", name.c_str());
-                return -6;
+                return zr7::kStatusSeedFailed;
             }
             loader_found = true;
         }
         if (seeded && name.find('\n') != std::string::npos) {
             ZR7_ERROR("Error: Can't seed <%s>: the name holds a line break", name.c_str());
             ZR7_ERROR("Error: Seeding <%s> failed", name.c_str());
-            return -6;
+            return zr7::kStatusSeedFailed;
         }
         if (preview)
             on_action(seeded ? zr7::Action::kSeed : zr7::Action::kPass, dst + "/" + name, "");

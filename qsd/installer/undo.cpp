@@ -17,6 +17,7 @@
 #include "qsd/installer/run_store.h"
 #include "qsd/platform/directory_lock.h"
 #include "qsd/platform/interruption.h"
+#include "qsd/platform/status.h"
 #include "qsd/platform/trace.h"
 
 namespace {
@@ -86,7 +87,7 @@ int Installer610::undo() {
     if (error != 0 && error != ENOENT) {
         ZR7_ERROR("Error: Can't open <%s>", store_path.c_str());
         ZR7_ERROR("Error: <%s>: %s", store_path.c_str(), zr7::fs::error_text(error).c_str());
-        ZR7_RETURN(-8);
+        ZR7_RETURN(zr7::kStatusCannotWrite);
     }
     if (error == 0) {
         const zr7::StringList ids = zr7::run_ids(store.get());
@@ -102,9 +103,10 @@ int Installer610::undo() {
     }
     if (id.empty()) {
         ZR7_ERROR("Error: Nothing to undo in <%s>", home.c_str());
-        ZR7_RETURN(-12);
+        ZR7_RETURN(zr7::kStatusNothingToUndo);
     }
     ZR7_DETAIL("Undoing the run <%s>", id.c_str());
+    undone_run = id;
     if (!preview && (status_of_start = begin_run_dir(false)) != 0)
         ZR7_RETURN(status_of_start);
 
@@ -120,7 +122,7 @@ int Installer610::undo() {
         const std::string shown = store_path + "/" + id + "/" + zr7::kJournalFile;
         ZR7_ERROR("Error: Can't open <%s>", shown.c_str());
         ZR7_ERROR("Error: <%s>: %s", shown.c_str(), zr7::fs::error_text(error).c_str());
-        ZR7_RETURN(-8);
+        ZR7_RETURN(zr7::kStatusCannotWrite);
     }
 
     // What the journal says, path by path, in the order the run first
@@ -173,7 +175,7 @@ int Installer610::undo() {
             if (!preview && (error = zr7::fs::remove_dir(dir.get(), name)) != 0) {
                 ZR7_ERROR("Error: Can't remove <%s>", shown.c_str());
                 ZR7_ERROR("Error: <%s>: %s", shown.c_str(), zr7::fs::error_text(error).c_str());
-                status = -5;
+                status = zr7::kStatusCopyFailed;
                 break;
             }
             removed.insert(relative);
@@ -196,7 +198,7 @@ int Installer610::undo() {
             if (!preview && (error = zr7::fs::remove_file(dir.get(), name)) != 0) {
                 ZR7_ERROR("Error: Can't remove <%s>", shown.c_str());
                 ZR7_ERROR("Error: <%s>: %s", shown.c_str(), zr7::fs::error_text(error).c_str());
-                status = -5;
+                status = zr7::kStatusCopyFailed;
                 break;
             }
             removed.insert(relative);
@@ -241,7 +243,7 @@ int Installer610::undo() {
                                               now_st.st_mode, zr7::backup_stamp(std::time(nullptr)),
                                               backup) != 0) {
                 ZR7_ERROR("Error: Can't backup VXAENV");
-                status = -9;
+                status = zr7::kStatusBackupFailed;
                 break;
             }
             on_action(zr7::Action::kBackup, backup, "");
@@ -270,7 +272,7 @@ int Installer610::undo() {
             if (error != 0) {
                 ZR7_ERROR("Error: Can't restore <%s>", shown.c_str());
                 ZR7_ERROR("Error: <%s>: %s", shown.c_str(), zr7::fs::error_text(error).c_str());
-                status = -5;
+                status = zr7::kStatusCopyFailed;
                 break;
             }
         }
@@ -287,13 +289,13 @@ int Installer610::undo() {
         // the installation before it.
         if (!preview && (error = zr7::write_run_file(run.get(), kUndoneMark, run_id + "\n")) != 0) {
             ZR7_ERROR("Error: Can't mark <%s> undone", (store_path + "/" + id).c_str());
-            status = -8;
+            status = zr7::kStatusCannotWrite;
         }
     }
     if (status == 0 && conflicts > 0) {
         ZR7_ERROR("Error: %d files changed since the installation were left as they are",
                   conflicts);
-        status = -13;
+        status = zr7::kStatusUndoConflicts;
     }
     ZR7_RETURN(status);
 }

@@ -1,4 +1,5 @@
 #include "qsd/platform/directory_lock.h"
+#include "qsd/platform/status.h"
 
 #include <fcntl.h>
 #include <sys/file.h>
@@ -136,7 +137,7 @@ DirectoryLock::DirectoryLock(const std::string& dir) {
     const int base = open_lock_directory(base_path);
     if (base < 0) {
         error_ = errno;
-        failure_ = -7;
+        failure_ = zr7::kStatusCannotOpen;
         ZR7_ERROR("Error: Can't open <%s>", base_path.c_str());
         return;
     }
@@ -146,7 +147,7 @@ DirectoryLock::DirectoryLock(const std::string& dir) {
     ::close(base);
     struct stat lock_st {};
     if (lock_fd_ < 0 || ::fstat(lock_fd_, &lock_st) != 0 || !S_ISREG(lock_st.st_mode)) {
-        failure_ = -7;
+        failure_ = zr7::kStatusCannotOpen;
         ZR7_ERROR("Error: Can't open <%s/%s>", base_path.c_str(), name.c_str());
         return;
     }

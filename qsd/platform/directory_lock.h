@@ -18,10 +18,9 @@
 
 #include <string>
 
-namespace zr7 {
+#include "qsd/platform/status.h"
 
-// The status of a run that gave up waiting for another installation.
-constexpr int kStatusLockTimeout = -10;
+namespace zr7 {
 
 constexpr int kDefaultLockWaitSeconds = 600;
 constexpr int kMaxLockWaitSeconds = 86400;
@@ -56,9 +55,6 @@ class DirectoryLock {
     // or lock file refused). 0 otherwise: held, or the directory itself
     // could not be opened, which the caller reports in its own words.
     int failure() const { return failure_; }
-    // The directory's descriptor (-1 when it could not be opened), also
-    // good for syncing the directory.
-    int fd() const { return fd_; }
 
   private:
     void take(const std::string& dir, int lock_fd);

@@ -10,11 +10,12 @@
 #include <signal.h>
 #include <sys/types.h>
 
+#include "qsd/platform/status.h"
+
 namespace zr7 {
 
-// The status that an operation returns when it stopped because of a
-// recorded signal; the run turns it into 128+N.
-constexpr int kStatusInterrupted = -11;
+// An operation that stopped because of a recorded signal returns
+// kStatusInterrupted (status.h); the run turns it into 128+N.
 
 // Installs the recording handler for SIGINT, SIGTERM and SIGHUP (the
 // installing run, once, at its start). Interrupted system calls restart.

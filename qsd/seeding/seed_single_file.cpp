@@ -6,9 +6,9 @@
 #include "qsd/installer/installer610.h"
 #include "qsd/platform/fs.h"
 #include "qsd/platform/process.h"
+#include "qsd/platform/status.h"
 #include "qsd/platform/trace.h"
 #include "qsd/seeding/seed_texts.h"
-#include "qsd/seeding/sql_selection.h"
 
 namespace {
 
@@ -54,7 +54,7 @@ int Installer610::seed_single_file(const std::string& dst_dir, const std::string
     // line break would hand it lines of the image's choosing.
     if (file_name.find('\n') != std::string::npos) {
         ZR7_ERROR("Error: Can't seed <%s>: the name holds a line break", file_name.c_str());
-        ZR7_RETURN(-6);
+        ZR7_RETURN(zr7::kStatusSeedFailed);
     }
 
     ZR7_DETAIL("Using SQLLIB <%s> ", dst_dir.c_str());
@@ -68,7 +68,7 @@ int Installer610::seed_single_file(const std::string& dst_dir, const std::string
     // The response file lives in a directory that everybody may write: it is
     // made under a scratch name nobody can have prepared and renamed into
     // place, and the loader reads it from the descriptor written here.
-    int status = -6;
+    int status = zr7::kStatusSeedFailed;
     const std::string content = zr7::response_file_content(protocol, host_name, port, file_name);
     zr7::fs::UniqueFd tmp_dir;
     int error = zr7::fs::open_trusted_dir(tmp_path, tmp_dir);
@@ -86,11 +86,11 @@ int Installer610::seed_single_file(const std::string& dst_dir, const std::string
     if (error != 0) {
         ZR7_DETAIL("Error: Unable to create <%s> ", response_path.c_str());
         ZR7_ERROR("Error: <%s>: %s", response_path.c_str(), zr7::fs::error_text(error).c_str());
-        status = -8;
+        status = zr7::kStatusCannotWrite;
     } else if (!log_path.empty() && (error = open_seeding_log(file_name, log_fd)) != 0) {
         ZR7_DETAIL("Error: Can't open <%s>", log_path.c_str());
         ZR7_ERROR("Error: <%s>: %s", log_path.c_str(), zr7::fs::error_text(error).c_str());
-        status = -6;
+        status = zr7::kStatusSeedFailed;
     } else {
         ZR7_DETAIL("protocol <%s> hostname <%s> port <%s>", protocol.c_str(), host_name.c_str(),
                    port.c_str());

@@ -1,5 +1,7 @@
 #include "qsd/seeding/seed_texts.h"
 
+#include "qsd/text/text.h"
+
 #include "qsd/fileops/install_util.h"
 
 namespace zr7 {
@@ -26,6 +28,16 @@ std::string loader_command_text(const std::string& response_path, const std::str
     if (!log_path.empty())
         text += " >>" + InstallUtil::quote_str(log_path.c_str());
     return text;
+}
+
+SqlSelection select_sql_name(const std::string& name) {
+    const std::string lower = to_lower_c(name);
+    if (lower.find("_del") != std::string::npos)
+        return SqlSelection::kDeletion;
+    // Of the names of four bytes or fewer only ".sql" itself passes.
+    if (!ends_with(lower, ".sql"))
+        return SqlSelection::kNotSql;
+    return SqlSelection::kSeed;
 }
 
 }  // namespace zr7

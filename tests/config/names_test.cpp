@@ -3,7 +3,7 @@
 
 #include <string>
 
-#include "qsd/config/names.h"
+#include "qsd/config/kmsenv_reader.h"
 
 namespace {
 

@@ -9,7 +9,6 @@
 #include <tuple>
 #include <vector>
 
-#include "qsd/fileops/copy_options.h"
 #include "qsd/fileops/install_util.h"
 #include "qsd/platform/trace.h"
 #include "support/test_support.h"

@@ -11,7 +11,6 @@
 
 #include "qsd/installer/installer610.h"
 #include "qsd/seeding/seed_texts.h"
-#include "qsd/seeding/sql_selection.h"
 #include "support/test_support.h"
 
 namespace {
