@@ -53,7 +53,7 @@ soak:
 	cmake -S . -B $(BUILD_TEST) -G Ninja -DCMAKE_BUILD_TYPE=Debug -DZR7_SANITIZE=ON \
 		-DZR7_BENCH=ON $(WERROR_DEV)
 	cmake --build $(BUILD_TEST) -j $(JOBS)
-	ZR7_SOAK=1 $(SANITIZER_OPTIONS) $(BUILD_TEST)/bin/test_robustness
+	ZR7_SOAK=1 $(SANITIZER_OPTIONS) $(BUILD_TEST)/bin/test_tool
 
 # The fuzz targets, built with clang apart from the main build, each run for
 # FUZZ_SECONDS seconds.
@@ -73,9 +73,9 @@ MEMCHECK = $(shell command -v valgrind) -q --error-exitcode=99 --leak-check=full
 memcheck:
 	cmake -S . -B $(BUILD_MEMCHECK) -G Ninja -DCMAKE_BUILD_TYPE=Debug -DZR7_SANITIZE=OFF \
 		$(WERROR_DEV)
-	cmake --build $(BUILD_MEMCHECK) -j $(JOBS) --target test_e2e
+	cmake --build $(BUILD_MEMCHECK) -j $(JOBS) --target test_tool
 	rm -rf $(BUILD_MEMCHECK)/valgrind && mkdir -p $(BUILD_MEMCHECK)/valgrind
-	ZR7_TOOL_WRAPPER="$(MEMCHECK)" $(BUILD_MEMCHECK)/bin/test_e2e
+	ZR7_TOOL_WRAPPER="$(MEMCHECK)" $(BUILD_MEMCHECK)/bin/test_tool
 	@reports=$$(find $(BUILD_MEMCHECK)/valgrind -type f -size +0c); \
 	if [ -n "$$reports" ]; then cat $$reports; echo "memcheck: errors reported"; exit 1; fi; \
 	echo "memcheck: $$(ls $(BUILD_MEMCHECK)/valgrind | wc -l) runs of the tool, no error, no leak"

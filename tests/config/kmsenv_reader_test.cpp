@@ -71,23 +71,4 @@ TEST(KmsenvReaderTest, MembersFamilySettingAndDetailLines) {
     }
 }
 
-TEST(ReadConfigTest, MissingFileReturnsTheErrorNumberAndItsReasonAndChangesNothing) {
-    zr7test::TempDir home;
-    zr7::trace_reconfigure("ERROR");
-    Installer610 installer;
-    installer.host_name = "before";
-    int rc = 0;
-    const std::string out =
-        zr7test::capture_stdout([&] { rc = installer.read_config(home.path() + "/"); });
-    EXPECT_EQ(rc, 2);
-    EXPECT_TRUE(zr7test::has_trace_line(out, "Error: Can't open kmsenv")) << out;
-    // The file and the system's reason follow, the path without a doubled "/".
-    EXPECT_TRUE(zr7test::has_trace_line(
-        out, "Error: <" + home.path() + "/config/.ConfigData/kmsenv>: No such file or directory"))
-        << out;
-    EXPECT_EQ(std::count(out.begin(), out.end(), '\n'), 2) << out;
-    EXPECT_EQ(installer.host_name, "before");
-    EXPECT_EQ(installer.family_setting, "");
-}
-
 }  // namespace

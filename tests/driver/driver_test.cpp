@@ -98,7 +98,10 @@ TEST(CheckCommandLine, RunHelpVersionOrRefusalWithItsReason) {
         {{"--help=x", "/img"}, A::kRefuse, "unknown option --help=x"},
         {{"--HELP"}, A::kRefuse, "unknown option --HELP"},
         {{"-x", "--help"}, A::kRefuse, "unknown option -x"},
-        {{"--he\nlp", "/img"}, A::kRefuse, "unknown option --he\nlp"}};
+        {{"--he\nlp", "/img"}, A::kRefuse, "unknown option --he\nlp"},
+        {{"-u", "-h", "/h"}, A::kRun, ""},
+        {{"-n", "-u"}, A::kRun, ""},
+        {{"-u", "/img"}, A::kRefuse, "-u takes no src_dir, 1 given"}};
     for (const auto& [args, action, fault] : cases) {
         std::vector<std::string> texts{"zr7inst"};
         texts.insert(texts.end(), args.begin(), args.end());
@@ -111,7 +114,6 @@ TEST(CheckCommandLine, RunHelpVersionOrRefusalWithItsReason) {
     }
 }
 
-// The fourteen lines of old stay first and whole; added options follow.
 // The log's first and last lines of a run.
 TEST(RunRecord, HeaderAndClosingLines) {
     Argv argv({"/bin/zr7inst", "-o", "/s/logs/", "-m", "a b", "/img"});
@@ -140,23 +142,6 @@ TEST(RunRecord, HeaderAndClosingLines) {
     EXPECT_TRUE(std::regex_match(zr7::iso_local_time(0),
                                  std::regex(R"(19(69|70)-\d\d-\d\dT\d\d:\d\d:\d\d[+-]\d{4})")))
         << zr7::iso_local_time(0);
-}
-
-// Shown only: the tool's path bare, a piece with white space in double quotes.
-TEST(RelaunchCommandText, LogOptionFirstAndAppendToTheLogLast) {
-    const std::tuple<const char*, std::vector<std::string>, const char*> cases[] = {
-        {"/opt/srv/",
-         {"zr7inst", "-c", "KEY=val", "/img"},
-         "zr7inst -o /opt/srv/logs/ -c KEY=val /img >>/opt/srv/logs/qsdinst.log"},
-        {"/opt/my srv/",
-         {"/my tools/zr7inst", "-c", "K=a b", "/img"},
-         "/my tools/zr7inst -o \"/opt/my srv/logs/\" -c \"K=a b\" /img "
-         ">>\"/opt/my srv/logs/qsdinst.log\""},
-        {"./", {"zr7inst", "-m", "", "/img"}, "zr7inst -o ./ -m  /img >>./qsdinst.log"}};
-    for (const auto& [home, args, text] : cases) {
-        Argv argv(args);
-        EXPECT_EQ(zr7::relaunch_command_text(argv.argc(), argv.pointers.data(), home), text);
-    }
 }
 
 zr7::ProgressState at(const char* name) {

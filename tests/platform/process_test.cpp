@@ -100,46 +100,4 @@ TEST(ProcessChild, CallersDescriptorsWinOverPaths) {
     EXPECT_FALSE(zr7test::exists(dir / "unused"));
 }
 
-// SIGTERM to a process that waits with forwarding on reaches the program and
-// not the waiting process, which gets the program's end as its result.
-TEST(ProcessChild, SignalsPassedOnWhileWaiting) {
-    ProcessSpec job = job_of("sleep", {"30"});
-    job.forward_signals = true;
-    const pid_t self = ::getpid();
-    std::thread sender([self] {
-        std::this_thread::sleep_for(std::chrono::milliseconds(500));
-        ::kill(self, SIGTERM);
-    });
-    const auto began = std::chrono::steady_clock::now();
-    const zr7::ProcessResult result = zr7::run_process_ex(job);
-    sender.join();
-    EXPECT_EQ(result.signal, SIGTERM);
-    EXPECT_EQ(result.status, 128 + SIGTERM);
-    EXPECT_LT(std::chrono::steady_clock::now() - began, std::chrono::seconds(20));
-    // The handler is gone again: SIGTERM is back at its earlier action.
-    struct sigaction now {};
-    ASSERT_EQ(::sigaction(SIGTERM, nullptr, &now), 0);
-    EXPECT_EQ(now.sa_handler, SIG_DFL);
-}
-
-// The installing run's handlers only record: the process goes on, and the
-// first signal is the one reported.
-TEST(Interruption, RecordedNotFatal) {
-    struct sigaction saved[3]{};
-    const int signals[] = {SIGINT, SIGTERM, SIGHUP};
-    for (int i = 0; i < 3; ++i)
-        ::sigaction(signals[i], nullptr, &saved[i]);
-    zr7::reset_interruption();
-    zr7::catch_interruptions();
-    EXPECT_EQ(zr7::interruption(), 0);
-    ::raise(SIGHUP);
-    EXPECT_EQ(zr7::interruption(), SIGHUP);
-    ::raise(SIGTERM);
-    EXPECT_EQ(zr7::interruption(), SIGHUP);
-    EXPECT_EQ(zr7::interrupted_status(SIGTERM), 143);
-    zr7::reset_interruption();
-    for (int i = 0; i < 3; ++i)
-        ::sigaction(signals[i], &saved[i], nullptr);
-}
-
 }  // namespace

@@ -69,39 +69,6 @@ TEST(TraceLine, StampPidUnitAndLineThenTheMessage) {
     EXPECT_EQ(traced_run("NONE"), "");
 }
 
-// A name cannot make a line of its own, nor send a terminal a command; an
-// error line of the installing run also goes to standard error, as the same
-// escaped text, and only an error-class line beginning with "Error:".
-TEST(TraceLine, EscapesTheMessageAndEchoesErrors) {
-    zr7::trace_reconfigure("ALL");
-    const std::string forged = "x>\nExiting with rc <0>\n\033]0;t\x07\\";
-    const std::string shown = "x>\\nExiting with rc <0>\\n\\x1b]0;t\\x07\\\\";
-    for (const bool echo : {false, true}) {
-        zr7::trace_echo_errors(echo);
-        testing::internal::CaptureStdout();
-        testing::internal::CaptureStderr();
-        [&] {
-            ZR7_OPERATION("TraceTest::escape");
-            ZR7_DETAIL("Error: detail <%s>", forged.c_str());
-            ZR7_ERROR("Error: Can't open <%s>", forged.c_str());
-            ZR7_ERROR("Not an error line <%s>", forged.c_str());
-            ZR7_ERROR_TEXT("Error: Bad server name <" + std::string("a\0b", 3) + ">");
-        }();
-        const std::string err = testing::internal::GetCapturedStderr();
-        const std::string out = testing::internal::GetCapturedStdout();
-        zr7::trace_echo_errors(false);
-        EXPECT_TRUE(zr7test::has_trace_line(out, "Error: detail <" + shown + ">")) << out;
-        EXPECT_TRUE(zr7test::has_trace_line(out, "Error: Can't open <" + shown + ">")) << out;
-        EXPECT_TRUE(zr7test::has_trace_line(out, "Not an error line <" + shown + ">")) << out;
-        EXPECT_TRUE(zr7test::has_trace_line(out, "Error: Bad server name <a\\x00b>")) << out;
-        EXPECT_EQ(out.find("\nExiting"), std::string::npos) << out;
-        EXPECT_EQ(out.find('\033'), std::string::npos) << out;
-        EXPECT_EQ(err, echo
-                           ? "Error: Can't open <" + shown + ">\nError: Bad server name <a\\x00b>\n"
-                           : "");
-    }
-}
-
 TEST(PutEnv, KeepsItsOwnCopyOfTheEntry) {
     char entry[] = "ZR7_PUTENV_TEST=first";
     ASSERT_EQ(PLT1_PutEnv(entry), 0);

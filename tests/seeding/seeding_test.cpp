@@ -85,17 +85,6 @@ TEST_F(LoaderRunTest, LoaderGetsAPrivateResponseFileAndItsEntriesAndAppendsToThe
               std::string::npos);
 }
 
-TEST_F(LoaderRunTest, LoaderFailureGivesMinus6AndPassedOverNamesRunNothing) {
-    ::setenv("QDSLOAD_FAIL", "a.sql", 1);
-    EXPECT_EQ(installer.seed_single_file(sqllib, "a.sql"), -6);
-    EXPECT_TRUE(list_dir(scratch).empty());
-    for (const char* name : {"x_del.sql", "notes.txt"}) {
-        zr7test::write_file(sqllib + "/" + name, "SELECT 1;\n");
-        EXPECT_EQ(installer.seed_single_file(sqllib, name), 0);
-    }
-    EXPECT_EQ(list_dir(record), (Names{"a.sql.env", "a.sql.rsp"}));
-}
-
 TEST_F(LoaderRunTest, ResponseFileThatCannotBeWrittenGivesMinus8AndRunsNothing) {
     std::fflush(stdout);
     const pid_t pid = ::fork();

@@ -2,11 +2,15 @@
 
 #include <dirent.h>
 #include <fcntl.h>
+#include <grp.h>
+#include <signal.h>
+#include <sys/resource.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
 #include <algorithm>
+#include <cerrno>
 #include <cstdio>
 #include <filesystem>
 #include <fstream>
@@ -69,6 +73,31 @@ void remove_tree(const std::string& path) {
     remove_at(AT_FDCWD, path);
 }
 
+std::string tree_text(const std::string& dir, bool server_only) {
+    std::vector<std::string> lines;
+    for (const auto& e : fs::recursive_directory_iterator(dir)) {
+        const std::string path = e.path().string();
+        if (is_run_record(path) ||
+            (server_only && (path.find("/logs/") != std::string::npos ||
+                             path.find("/.archive") != std::string::npos ||
+                             path.find("qdsload.catalog") != std::string::npos))) {
+            continue;
+        }
+        struct stat st {};
+        ::lstat(path.c_str(), &st);
+        lines.push_back(path + " " + std::to_string(st.st_mode) + " " + std::to_string(st.st_uid) +
+                        ":" + std::to_string(st.st_gid) + " " +
+                        (S_ISREG(st.st_mode)   ? read_file(path)
+                         : S_ISLNK(st.st_mode) ? fs::read_symlink(path).string()
+                                               : ""));
+    }
+    std::sort(lines.begin(), lines.end());
+    std::string text;
+    for (const std::string& line : lines)
+        text += line + "\n";
+    return text;
+}
+
 std::vector<std::string> list_dir(const std::string& path) {
     std::vector<std::string> names;
     std::error_code none;
@@ -121,8 +150,8 @@ const std::string& reachable_dir() {
     return reachable.path();
 }
 
-RunResult run(const std::string& program, const std::vector<std::string>& args,
-              const RunOptions& options) {
+pid_t start(const std::string& program, const std::vector<std::string>& args,
+            const RunOptions& options, int out_fd, int err_fd) {
     const char* wrapper = std::getenv("ZR7_TOOL_WRAPPER");
     std::istringstream words(program == tool_path() && wrapper != nullptr ? wrapper : "");
     std::vector<std::string> texts{std::istream_iterator<std::string>(words), {}};
@@ -130,29 +159,71 @@ RunResult run(const std::string& program, const std::vector<std::string>& args,
     texts.insert(texts.end(), args.begin(), args.end());
     std::vector<char*> argv(texts.size() + 1, nullptr);
     std::transform(texts.begin(), texts.end(), argv.begin(), [](auto& t) { return t.data(); });
-    TempDir capture;
+    // The environment and every path are made before the fork.
+    std::map<std::string, std::string> env;
+    for (char** entry = environ; *entry != nullptr; ++entry) {
+        const std::string text = *entry;
+        env[text.substr(0, text.find('='))] =
+            text.substr(std::min(text.find('='), text.size()) + 1);
+    }
+    const std::string bin = options.as_nobody ? reachable_bin_dir() : bin_dir();
+    env["PATH"] = bin + ":" + env["PATH"];
+    for (const std::string& name : options.unset_env)
+        env.erase(name);
+    for (const auto& [name, value] : options.set_env)
+        env[name] = value;
+    std::vector<std::string> entries;
+    for (const auto& [name, value] : env)
+        entries.push_back(name + "=" + value);
+    std::vector<char*> envp(entries.size() + 1, nullptr);
+    std::transform(entries.begin(), entries.end(), envp.begin(), [](auto& e) { return e.data(); });
     const std::string in = options.stdin_path.empty() ? "/dev/null" : options.stdin_path;
-    const std::string err = options.stderr_path.empty() ? capture / "err" : options.stderr_path;
+    struct rlimit limit {};
+    limit.rlim_cur = limit.rlim_max = static_cast<rlim_t>(options.file_limit);
     std::fflush(nullptr);
     const pid_t pid = ::fork();
     if (pid == 0) {
-        if (!std::freopen(in.c_str(), "r", stdin) || !std::freopen(err.c_str(), "w", stderr) ||
-            !std::freopen((capture / "out").c_str(), "w", stdout) ||
-            (!options.cwd.empty() && ::chdir(options.cwd.c_str()) != 0))
-            ::_exit(127);
-        ::setenv("PATH", (bin_dir() + ":" + std::getenv("PATH")).c_str(), 1);
-        for (const std::string& name : options.unset_env)
-            ::unsetenv(name.c_str());
-        for (const auto& [name, value] : options.set_env)
-            ::setenv(name.c_str(), value.c_str(), 1);
-        ::execvp(argv[0], argv.data());
+        ::setpgid(0, 0);
+        ::signal(SIGXFSZ, SIG_IGN);
+        ::umask(022);  // the modes the tests expect, whoever runs them
+        const int in_fd = ::open(in.c_str(), O_RDONLY);
+        const int err = options.stderr_path.empty() ? err_fd
+                                                    : ::open(options.stderr_path.c_str(),
+                                                             O_WRONLY | O_CREAT | O_TRUNC, 0644);
+        if ((options.cwd.empty() || ::chdir(options.cwd.c_str()) == 0) && in_fd >= 0 &&
+            ::dup2(in_fd, 0) == 0 && ::dup2(out_fd, 1) == 1 && ::dup2(err, 2) == 2 &&
+            (options.file_limit < 0 || ::setrlimit(RLIMIT_FSIZE, &limit) == 0) &&
+            (!options.as_nobody ||
+             (::setgroups(0, nullptr) == 0 && ::setgid(65534) == 0 && ::setuid(65534) == 0))) {
+            environ = envp.data();
+            ::execvp(argv[0], argv.data());
+        }
         ::_exit(127);
     }
-    int status = 0;
-    if (pid < 0 || ::waitpid(pid, &status, 0) != pid)
+    if (pid < 0)
         throw std::runtime_error("cannot run " + program);
-    return {WIFEXITED(status) ? WEXITSTATUS(status) : 128 + WTERMSIG(status),
-            read_file(capture / "out"), options.stderr_path.empty() ? read_file(err) : ""};
+    ::setpgid(pid, pid);  // here too, so that a kill right after the start finds the group
+    return pid;
+}
+
+int wait_for(pid_t pid) {
+    int status = -1;
+    while (::waitpid(pid, &status, 0) < 0 && errno == EINTR) {
+    }
+    return WIFEXITED(status) ? WEXITSTATUS(status) : 128 + WTERMSIG(status);
+}
+
+RunResult run(const std::string& program, const std::vector<std::string>& args,
+              const RunOptions& options) {
+    TempDir capture;
+    const int out = ::open((capture / "out").c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0644);
+    const int err = ::open((capture / "err").c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0644);
+    const pid_t pid = start(program, args, options, out, err);
+    ::close(out);
+    ::close(err);
+    const int code = wait_for(pid);
+    return {code, read_file(capture / "out"),
+            options.stderr_path.empty() ? read_file(capture / "err") : ""};
 }
 
 SampleInstall::SampleInstall(const std::string& parent)

@@ -22,6 +22,12 @@ inline bool is_run_record(const std::string& path) {
            path.find("/logs/qsdinst.") != std::string::npos;
 }
 
+// Every entry below `dir`, sorted, one line each: path, mode, owner, and a
+// file's bytes or a link's target; the run records left out, and with
+// `server_only` also the logs, the backups and the stand-in loader's catalog
+// (what undo does not give back). For "nothing changed" and "all given back".
+std::string tree_text(const std::string& dir, bool server_only = false);
+
 // A fresh scratch directory, removed with its contents when the object goes away;
 // under `parent` when one is given, else under the system's scratch directory.
 class TempDir {
@@ -46,9 +52,19 @@ struct RunOptions {
     std::vector<std::string> unset_env;
     // When "": the test's own directory, /dev/null, captured into RunResult::err.
     std::string cwd, stdin_path, stderr_path;
+    long long file_limit = -1;  // RLIMIT_FSIZE in bytes, SIGXFSZ ignored
+    bool as_nobody = false;     // setgid and setuid 65534 before exec
 };
-// Runs a program (a path) with build/bin first on PATH and its output captured.
-// The words of ZR7_TOOL_WRAPPER (a memory checker, say) go before the tool.
+// The one launcher: starts a program (a path) in a process group of its own
+// (kill(-pid) reaches its children), with build/bin first on PATH, umask 022,
+// standard output on `out_fd` and standard error on `err_fd` (or the
+// options' stderr_path). The words of ZR7_TOOL_WRAPPER (a memory checker,
+// say) go before the tool. The child allocates nothing after the fork.
+pid_t start(const std::string& program, const std::vector<std::string>& args,
+            const RunOptions& options, int out_fd, int err_fd);
+// Waits for a started program: 0..255, or 128+N for signal N.
+int wait_for(pid_t pid);
+// Starts a program and waits, its output captured.
 RunResult run(const std::string& program, const std::vector<std::string>& args,
               const RunOptions& options = {});
 inline std::string bin_dir() {

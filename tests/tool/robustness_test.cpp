@@ -50,52 +50,25 @@ struct Launch {
     bool image = true;  // the image last (an undo has none)
 };
 
-// Starts the tool with standard output and error on `fd`, in a process group
-// of its own (kill(-pid) reaches its children). The child allocates nothing.
-// An unprivileged run starts the copies in a directory every account reaches.
+// Starts the tool on the sample through the one launcher, standard output and
+// error on `fd`.
 pid_t start(const SampleInstall& s, const Launch& l, int fd) {
     const std::string bin = l.as_nobody ? zr7test::reachable_bin_dir() : zr7test::bin_dir();
-    std::vector<std::string> args{bin + "/zr7inst", "-o", s.home + "/logs/", "-h", s.home};
-    args.erase(args.begin() + 1, args.begin() + (l.relaunch ? 3 : 1));
+    std::vector<std::string> args{"-o", s.home + "/logs/", "-h", s.home};
+    args.erase(args.begin(), args.begin() + (l.relaunch ? 2 : 0));
     args.insert(args.end(), l.options.begin(), l.options.end());
     if (l.image)
         args.push_back(s.image);
-    std::vector<char*> argv(args.size() + 1, nullptr);
-    std::transform(args.begin(), args.end(), argv.begin(), [](auto& a) { return a.data(); });
-    for (const char* name : {"MARLIN_HOME", "MARLINHOME", "QDSLOAD_FAIL", "QDSLOAD_RECORD"})
-        ::unsetenv(name);
-    (void)(l.relaunch ? ::unsetenv("VXA_TRC1") : ::setenv("VXA_TRC1", "ERROR (UNIT:zr7 ALL)", 1));
-    std::vector<std::string> env{"PATH=" + bin + ":" + std::getenv("PATH")};
-    for (char** entry = environ; *entry != nullptr; ++entry) {
-        if (std::strncmp(*entry, "PATH=", 5) != 0)
-            env.push_back(*entry);
-    }
-    std::vector<char*> envp(env.size() + 1, nullptr);
-    std::transform(env.begin(), env.end(), envp.begin(), [](auto& e) { return e.data(); });
-    struct rlimit limit {};
-    limit.rlim_cur = limit.rlim_max = static_cast<rlim_t>(l.limit);
-    const pid_t pid = ::fork();
-    if (pid == 0) {
-        ::setpgid(0, 0);
-        ::signal(SIGXFSZ, SIG_IGN);
-        ::umask(022);  // the modes the tests expect, whoever runs them
-        if ((l.cwd.empty() || ::chdir(l.cwd.c_str()) == 0) &&
-            ::dup2(::open("/dev/null", O_RDONLY), 0) == 0 && ::dup2(fd, 1) == 1 &&
-            ::dup2(fd, 2) == 2 && (l.limit < 0 || ::setrlimit(RLIMIT_FSIZE, &limit) == 0) &&
-            (!l.as_nobody ||
-             (::setgroups(0, nullptr) == 0 && ::setgid(65534) == 0 && ::setuid(65534) == 0)))
-            ::execve(argv[0], argv.data(), envp.data());
-        ::_exit(127);
-    }
-    ::setpgid(pid, pid);  // here too, so that a kill right after the start finds the group
-    return pid;
+    zr7test::RunOptions options;
+    options.unset_env = {"MARLIN_HOME", "MARLINHOME", "QDSLOAD_FAIL", "QDSLOAD_RECORD", "VXA_TRC1"};
+    if (!l.relaunch)
+        options.set_env["VXA_TRC1"] = "ERROR (UNIT:zr7 ALL)";
+    options.cwd = l.cwd;
+    options.file_limit = l.limit;
+    options.as_nobody = l.as_nobody;
+    return zr7test::start(bin + "/zr7inst", args, options, fd, fd);
 }
-int wait_for(pid_t pid) {  // 0..255, or 128+N for signal N
-    int status = -1;
-    while (::waitpid(pid, &status, 0) < 0 && errno == EINTR) {
-    }
-    return WIFEXITED(status) ? WEXITSTATUS(status) : 128 + WTERMSIG(status);
-}
+using zr7test::wait_for;
 // Output and errors in RunResult::out, through a pipe: no file size limit reaches it.
 zr7test::RunResult run_tool(const SampleInstall& s, const Launch& l) {
     int fds[2];
@@ -321,7 +294,6 @@ const ShapeCase kCases[] = {
     {"link_to_directory", {"ln T/sub T/lnd"}, {}, 251, "Error: Directory loop at <"},
     {"dangling_link", {"ln R/gone T/dangling"}, {}, 0, "", "no H/dangling"},
     {"looping_links", {"ln T/loop_b T/loop_a", "ln T/loop_a T/loop_b"}, {}, 0, "", "no H/loop_a"},
-    {"link_to_an_ancestor", {"ln .. T/sub/up"}, {}, 251, "Error: Directory loop at <"},
     {"flat_link_to_file", {"ln I/ATTRLIB/kzr.atr I/ATTRLIB/ln.atr"}, {}, 0, "", "is H/ATTRLIB/ln.atr name kzr\nattr one\n"},
     {"flat_dangling_link", {"ln R/gone I/ATTRLIB/gone"}, {}, 0, "", "no H/ATTRLIB/gone"},
     {"flat_source_is_a_file", {"file I/ATTRLIB x"}, {}, 0, "No file to process in <"},
@@ -528,29 +500,6 @@ TEST(Kills, VxaenvIsAlwaysOldOrNewAndEveryBackupWhole) {
                 kills, after_change, seen.size());
 }
 
-// The server's files as undo must give them back: names, bytes, modes and
-// owners, without the records, logs, backups and the loader's catalog.
-std::string server_files(const std::string& home) {
-    std::string text;
-    std::vector<std::string> lines;
-    for (const auto& e : std::filesystem::recursive_directory_iterator(home)) {
-        const std::string path = e.path().string();
-        if (zr7test::is_run_record(path) || path.find("/logs/") != std::string::npos ||
-            path.find("/.archive") != std::string::npos ||
-            path.find("qdsload.catalog") != std::string::npos) {
-            continue;
-        }
-        struct stat st {};
-        ::lstat(path.c_str(), &st);
-        lines.push_back(path + " " + std::to_string(st.st_mode) + " " + std::to_string(st.st_uid) +
-                        " " + (S_ISREG(st.st_mode) ? read_file(path) : ""));
-    }
-    std::sort(lines.begin(), lines.end());
-    for (const auto& line : lines)
-        text += line + "\n";
-    return text;
-}
-
 // An undo killed at any moment, then run again, gives the installation back
 // whole: every step of it can be taken a second time.
 TEST(Kills, AnUndoKilledAtAnyMomentCompletesWhenRunAgain) {
@@ -563,7 +512,7 @@ TEST(Kills, AnUndoKilledAtAnyMomentCompletesWhenRunAgain) {
     for (int k = 0; k <= kills; ++k) {
         SampleInstall s;
         write_file(s.tables() + "/table.dat", "the server's\n", 0600);
-        const std::string before = server_files(s.home);
+        const std::string before = zr7test::tree_text(s.home, true);
         ASSERT_EQ(run_tool(s, {{"-m", "kzr", "-c", "K=v"}}).exit_code, 0);
         if (k == 0) {  // the first undo runs whole and gives the time an undo takes
             const auto began = std::chrono::steady_clock::now();
@@ -584,7 +533,7 @@ TEST(Kills, AnUndoKilledAtAnyMomentCompletesWhenRunAgain) {
             // The killed undo may have finished, or never begun.
             ASSERT_TRUE(again.exit_code == 0 || again.exit_code == 256 - 12) << again.out;
         }
-        EXPECT_EQ(server_files(s.home), before) << "kill " << k;
+        EXPECT_EQ(zr7test::tree_text(s.home, true), before) << "kill " << k;
     }
 }
 

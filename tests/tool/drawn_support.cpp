@@ -1,11 +1,11 @@
-#include "e2e/drawn_support.h"
+#include "tool/drawn_support.h"
 
 #include <sys/stat.h>
 #include <unistd.h>
 
 #include <filesystem>
 
-#include "e2e/e2e.h"
+#include "tool/tool.h"
 
 namespace zr7test {
 
@@ -34,23 +34,6 @@ Tree snapshot(const std::string& root) {
         tree[path] = entry;
     }
     return tree;
-}
-
-bool same_but_times(const Tree& a, const Tree& b, std::string& why) {
-    for (const auto& [path, entry] : a) {
-        const auto other = b.find(path);
-        if (other == b.end() || !entry.same_but_times(other->second)) {
-            why = path + (other == b.end() ? " is gone" : " differs");
-            return false;
-        }
-    }
-    for (const auto& [path, entry] : b) {
-        if (a.count(path) == 0) {
-            why = path + " is new";
-            return false;
-        }
-    }
-    return true;
 }
 
 void draw(SampleInstall& s, std::mt19937& random, bool failing) {

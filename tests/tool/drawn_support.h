@@ -16,20 +16,16 @@ struct Entry {
     unsigned mode = 0;
     unsigned uid = 0, gid = 0;
     long long mtime_ns = 0;
-    bool same_but_times(const Entry& o) const {
-        return kind == o.kind && bytes == o.bytes && mode == o.mode && uid == o.uid && gid == o.gid;
+    bool operator==(const Entry& o) const {
+        return kind == o.kind && bytes == o.bytes && mode == o.mode && uid == o.uid &&
+               gid == o.gid && mtime_ns == o.mtime_ns;
     }
-    bool operator==(const Entry& o) const { return same_but_times(o) && mtime_ns == o.mtime_ns; }
 };
 using Tree = std::map<std::string, Entry>;
 
 // Every entry below `root` but the run's records and logs, the backups, and
 // the stand-in loader's catalog.
 Tree snapshot(const std::string& root);
-
-// Whether two snapshots hold the same names, bytes, modes, owners, groups and
-// links; the first difference in `why`.
-bool same_but_times(const Tree& a, const Tree& b, std::string& why);
 
 // A home and an image drawn from `random`: the sample with files taken away
 // and added, destination files already there with the same bytes, other

@@ -11,8 +11,8 @@
 #include <set>
 #include <sstream>
 
-#include "e2e/drawn_support.h"
-#include "e2e/e2e.h"
+#include "tool/drawn_support.h"
+#include "tool/tool.h"
 
 namespace zr7test {
 namespace {
