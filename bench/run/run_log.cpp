@@ -9,16 +9,19 @@ namespace {
 constexpr const char* kClosing = "zr7inst run ends: ";
 
 // The number after "<key> " in a field of the line: the field starts the
-// text or follows ", ". False when the key is missing or no number follows.
+// text or follows ", " or the line's ": ", so that a key inside another
+// word is passed over. False when the key is missing or no number follows.
 bool field(const std::string& line, const std::string& key, double& value) {
     std::size_t at = 0;
     for (;;) {
         at = line.find(key + " ", at);
         if (at == std::string::npos)
             return false;
-        if (at == 0 || line.compare(at - 2, 2, ", ") == 0 || line.compare(at - 2, 2, ": ") == 0) {
+        const bool starts_field =
+            at == 0 ||
+            (at >= 2 && (line.compare(at - 2, 2, ", ") == 0 || line.compare(at - 2, 2, ": ") == 0));
+        if (starts_field)
             break;
-        }
         at += key.size();
     }
     const char* start = line.c_str() + at + key.size() + 1;
