@@ -3,13 +3,19 @@
 // very large directory install, and writes the results page.
 //
 //   zr7bench_run [--sizes small,default,large] [--rounds 5] [--seed N]
-//                [--bin DIR] [--script FILE] [--work DIR] [--out FILE]
-//                [--plot FILE|none] [--no-limits] [--keep]
+//                [--contestants A,B,C] [--bin DIR] [--script FILE] [--work DIR]
+//                [--out FILE] [--plot FILE|none] [--no-limits] [--keep]
+//
+// With A, each round also times A's preview, and A and its undo on a home
+// where A replaces every file (the journal's cost). --contestants A,C leaves
+// the slowest, the shell way, out of a run.
 //
 // Exit status: 0 when every run succeeded (the targets are reported, not
 // enforced: a shared machine can miss a timing target for reasons of its
-// own), 1 when a contestant failed or installed other bytes, 2 for a bad
+// own), 1 when a contestant or the preview failed, the tool and the shell way
+// installed other bytes, or an undo did not give the home back, 2 for a bad
 // command line or a broken setup.
+#include <fcntl.h>
 #include <linux/magic.h>
 #include <sys/stat.h>
 #include <sys/statfs.h>
@@ -30,6 +36,7 @@
 #include "bench/gen/write_tree.h"
 #include "bench/run/contestants.h"
 #include "bench/run/report.h"
+#include "bench/run/run_log.h"
 #include "bench/run/spawn.h"
 #include "bench/run/tree_digest.h"
 
@@ -42,6 +49,7 @@ struct Options {
     std::vector<std::string> sizes{"small", "default", "large"};
     int rounds = 5;
     std::uint64_t seed = 20261206;
+    std::string contestants = "ABC";  // the letters of those that run
     std::string bin_dir;
     std::string script = std::string(ZR7_SOURCE_DIR) + "/bench/shell_install.sh";
     std::string work;
@@ -54,8 +62,9 @@ struct Options {
 [[noreturn]] void usage() {
     std::fprintf(stderr,
                  "usage: zr7bench_run [--sizes small,default,large] [--rounds N] [--seed N]\n"
-                 "                    [--bin DIR] [--script FILE] [--work DIR] [--out FILE]\n"
-                 "                    [--plot FILE|none] [--no-limits] [--keep]\n");
+                 "                    [--contestants A,B,C] [--bin DIR] [--script FILE]\n"
+                 "                    [--work DIR] [--out FILE] [--plot FILE|none]\n"
+                 "                    [--no-limits] [--keep]\n");
     std::exit(2);
 }
 
@@ -129,6 +138,14 @@ Options parse(int argc, char** argv) {
             o.rounds = std::atoi(argv[++i]);
         } else if (arg == "--seed" && has_value) {
             o.seed = std::strtoull(argv[++i], nullptr, 10);
+        } else if (arg == "--contestants" && has_value) {
+            o.contestants.clear();
+            for (const std::string& id : split(argv[++i], ',')) {
+                if (id != "A" && id != "B" && id != "C")
+                    usage();
+                if (o.contestants.find(id) == std::string::npos)
+                    o.contestants += id;
+            }
         } else if (arg == "--bin" && has_value) {
             o.bin_dir = argv[++i];
         } else if (arg == "--script" && has_value) {
@@ -151,7 +168,7 @@ Options parse(int argc, char** argv) {
         if (files_for_size(size) == 0)
             usage();
     }
-    if (o.rounds < 1)
+    if (o.rounds < 1 || o.contestants.empty())
         usage();
     if (o.bin_dir.empty())
         o.bin_dir = dir_of_self();
@@ -288,14 +305,74 @@ SizeCase prepare_size(const Options& o, const std::string& name) {
     return sc;
 }
 
-// One round of one size: the three contestants, each on a fresh home, in an
-// order that turns with the round.
+// What a home holds apart from what differs by design between two moments of
+// it: the logs, the tool's run records and journals, the environment file's
+// backups and the stand-in loader's catalog record.
+TreeDigest home_digest(const Case& c) {
+    return digest_tree(c.home, {"logs", ".zr7inst", ".archive", "qdsload.catalog"});
+}
+
+// One byte more at the end of each file: other bytes at the same paths.
+void append_byte(const Case& c, const std::vector<std::string>& files) {
+    for (const std::string& rel : files) {
+        const std::string path = c.home + "/" + rel;
+        const int fd = ::open(path.c_str(), O_WRONLY | O_APPEND | O_CLOEXEC);
+        if (fd < 0 || ::write(fd, "x", 1) != 1 || ::close(fd) != 0)
+            fail_setup("cannot append to " + path);
+    }
+}
+
+// The journal's round: C's copies into a fresh home, each file they wrote
+// then given one byte more, so that A replaces every file it installs and
+// keeps each old version in its journal; then the undo of that installation,
+// which must leave the home as it was before A.
+void run_replace_round(const Options& o, const Bench& b, int round, SizeCase& sc) {
+    ReplaceRun r;
+    fresh_home(sc.c, sc.home);
+    const TreeDigest fresh = home_digest(sc.c);
+    if (run_floor(b, sc.c).exit_code != 0)
+        fail_setup("the floor's copies into " + sc.c.home + " failed");
+    const std::vector<std::string> written = written_files(fresh, home_digest(sc.c));
+    append_byte(sc.c, written);
+    r.files_prepared = written.size();
+    const TreeDigest before = home_digest(sc.c);
+    ::sync();
+
+    r.install = run_tool(b, sc.c);
+    const RunEnd end = last_run_end(read_text(sc.c.home + "/logs/qsdinst.log"));
+    if (end.found) {
+        r.files_copied = end.files_copied;
+        r.journal_s = end.journal_s;
+    }
+    r.undo = run_undo(b, sc.c);
+    const TreeDifference diff = compare_digests(before, home_digest(sc.c));
+    r.undo_differences = diff.count;
+    r.first_undo_difference = diff.first;
+    std::fprintf(stderr,
+                 "[%s] round %d/%d: A over %zu files %.2f s (exit %d, journal %.3f s), "
+                 "undo %.2f s (exit %d, %ld files differ)\n",
+                 sc.run.name.c_str(), round + 1, o.rounds, r.files_prepared, r.install.wall_s,
+                 r.install.exit_code, r.journal_s, r.undo.wall_s, r.undo.exit_code,
+                 r.undo_differences);
+    sc.run.replace.push_back(r);
+}
+
+// One round of one size: the contestants, each on a fresh home, in an order
+// that turns with the round; A's preview on A's fresh home just before A.
 void run_round(const Options& o, const Bench& b, int round, SizeCase& sc) {
     SizeRun& run = sc.run;
     ContestantRun* order[] = {&run.a, &run.b, &run.c};
     for (int k = 0; k < 3; ++k) {
         ContestantRun* who = order[(round + k) % 3];
+        if (o.contestants.find(who->id) == std::string::npos)
+            continue;
         fresh_home(sc.c, sc.home);
+        if (who->id == 'A') {
+            const Sample p = run_preview(b, sc.c);
+            run.preview.samples.push_back(p);
+            std::fprintf(stderr, "[%s] round %d/%d: A's preview %.2f s (exit %d)\n",
+                         run.name.c_str(), round + 1, o.rounds, p.wall_s, p.exit_code);
+        }
         const Sample s = who->id == 'A'   ? run_tool(b, sc.c)
                          : who->id == 'B' ? run_shell_way(b, sc.c)
                                           : run_floor(b, sc.c);
@@ -314,6 +391,8 @@ void run_round(const Options& o, const Bench& b, int round, SizeCase& sc) {
         sc.tool_digest.clear();
         sc.shell_digest.clear();
     }
+    if (o.contestants.find('A') != std::string::npos)
+        run_replace_round(o, b, round, sc);
 }
 
 // Every round runs every size, so that a change in the machine's load in the
@@ -402,10 +481,19 @@ std::string plot(const Options& o, const Bench& b, const Report& report) {
     g << "set terminal png size 800,500\n"
       << "set output '" << o.plot << "'\n"
       << "set title 'Installation wall time (median of " << report.rounds << " rounds)'\n"
-      << "set xlabel 'file copies'\nset ylabel 'seconds'\nset key left top\nset grid\n"
-      << "plot '" << data << "' using 1:3 with linespoints title 'B shell way', '" << data
-      << "' using 1:2 with linespoints title 'A tool', '" << data
-      << "' using 1:4 with linespoints title 'C floor'\n";
+      << "set xlabel 'file copies'\nset ylabel 'seconds'\nset key left top\nset grid\n";
+    // Only the contestants that ran: one left out has no times to draw.
+    const char* const lines[] = {"1:3 with linespoints title 'B shell way'",
+                                 "1:2 with linespoints title 'A tool'",
+                                 "1:4 with linespoints title 'C floor'"};
+    const char ids[] = {'B', 'A', 'C'};
+    std::string plots;
+    for (int k = 0; k < 3; ++k) {
+        if (o.contestants.find(ids[k]) != std::string::npos)
+            plots +=
+                std::string(plots.empty() ? "plot " : ", ") + "'" + data + "' using " + lines[k];
+    }
+    g << plots << "\n";
     g.close();
     SpawnSpec job;
     job.argv = {gnuplot, script};
@@ -451,8 +539,17 @@ int run(int argc, char** argv) {
 
     bool ok = static_cast<bool>(out);
     for (const SizeRun& size : report.sizes) {
-        ok = ok && size.a.all_succeeded() && size.b.all_succeeded() && size.c.all_succeeded() &&
-             size.differences == 0;
+        for (const ContestantRun* who : {&size.a, &size.b, &size.c, &size.preview}) {
+            const char id = who->id == 'P' ? 'A' : who->id;
+            if (o.contestants.find(id) != std::string::npos)
+                ok = ok && who->all_succeeded();
+        }
+        // Compared only when both ran.
+        if (o.contestants.find('A') != std::string::npos &&
+            o.contestants.find('B') != std::string::npos)
+            ok = ok && size.differences == 0;
+        for (const ReplaceRun& r : size.replace)
+            ok = ok && r.install.exit_code == 0 && r.home_given_back();
     }
     for (const RobustRun& r : report.robust)
         ok = ok && r.exit_code == 0 && r.found == r.expected;

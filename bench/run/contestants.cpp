@@ -50,6 +50,33 @@ Sample run_tool(const Bench& bench, const Case& c) {
     return s;
 }
 
+// The plan goes to a file, as a user would keep it to read.
+Sample run_preview(const Bench& bench, const Case& c) {
+    SpawnSpec job;
+    job.argv = {bench.bin_dir + "/zr7inst",
+                "-n",
+                "-h",
+                c.home,
+                "-c",
+                kBenchSetting,
+                "-m",
+                kBenchModule,
+                c.image};
+    job.env = bench.env;
+    job.stdout_path = bench.work + "/" + c.label + ".preview.out";
+    job.stderr_path = bench.work + "/" + c.label + ".preview.err";
+    return from_spawn(spawn_and_wait(job));
+}
+
+Sample run_undo(const Bench& bench, const Case& c) {
+    SpawnSpec job;
+    job.argv = {bench.bin_dir + "/zr7inst", "-u", "-h", c.home};
+    job.env = bench.env;
+    job.stdout_path = bench.work + "/" + c.label + ".undo.out";
+    job.stderr_path = bench.work + "/" + c.label + ".undo.err";
+    return from_spawn(spawn_and_wait(job));
+}
+
 Sample run_shell_way(const Bench& bench, const Case& c) {
     SpawnSpec job;
     job.argv = {bench.bash, bench.script, c.image,       c.home,
@@ -118,6 +145,11 @@ std::vector<std::string> describe_contestants() {
         "C, the floor: one `cp -a SRC/. DST` per command of the list (`cp -an` for the trees "
         "that keep existing files); no carriage returns removed, no environment file, no "
         "seeding.",
+        std::string("A's preview: `zr7inst -n -h HOME -c ") + kBenchSetting + " -m " +
+            kBenchModule +
+            " IMAGE`, its plan written to a file, on the fresh home just before A installs there.",
+        "The undo: `zr7inst -u -h HOME` after A's installation over a home that held every file "
+        "of the image with other bytes.",
     };
 }
 

@@ -4,6 +4,8 @@
 //   B  the same installation the shell way: one `sh -c` per file copied and
 //      per SQL file seeded (bench/shell_install.sh);
 //   C  the floor: `cp -a` of the same trees, nothing else.
+// Beside them, A's preview of the same installation (`-n`) and the undo of
+// A's newest installation into a home (`-u`).
 #pragma once
 
 #include <string>
@@ -38,6 +40,8 @@ constexpr const char* kBenchModule = "KBENCHMOD";
 Sample run_tool(const Bench& bench, const Case& c);
 Sample run_shell_way(const Bench& bench, const Case& c);
 Sample run_floor(const Bench& bench, const Case& c);
+Sample run_preview(const Bench& bench, const Case& c);
+Sample run_undo(const Bench& bench, const Case& c);
 
 // One line per contestant for the results page.
 std::vector<std::string> describe_contestants();

@@ -137,13 +137,117 @@ TargetCheck robust(const Report& report, const std::string& name, const char* ta
     return check;
 }
 
+TargetCheck preview_share(const Report& report) {
+    TargetCheck check{"A's preview (-n) under 5% of A's wall time on the large size", kNotMeasured,
+                      false};
+    const SizeRun* size = find_size(report, "large");
+    if (size == nullptr || !size->a.all_succeeded() || !size->preview.all_succeeded())
+        return check;
+    const double share = size->preview.wall().median / size->a.wall().median * 100.0;
+    check.measured = format("%.1f%% (%.2f s of %.2f s)", share, size->preview.wall().median,
+                            size->a.wall().median);
+    check.holds = share < 5.0;
+    return check;
+}
+
+// The medians of the rounds whose journal time was read.
+struct JournalFigures {
+    std::size_t rounds = 0;
+    double journal_s = 0;
+    double install_s = 0;
+};
+
+JournalFigures journal_figures(const SizeRun& size) {
+    std::vector<double> journal, install;
+    for (const ReplaceRun& r : size.replace) {
+        if (r.journal_read()) {
+            journal.push_back(r.journal_s);
+            install.push_back(r.install.wall_s);
+        }
+    }
+    JournalFigures f;
+    f.rounds = journal.size();
+    f.journal_s = summarize(journal).median;
+    f.install_s = summarize(install).median;
+    return f;
+}
+
+TargetCheck journal_share(const Report& report) {
+    TargetCheck check{
+        "journal time under 3% of A's wall time on the large size, every file replaced",
+        kNotMeasured, false};
+    const SizeRun* size = find_size(report, "large");
+    if (size == nullptr)
+        return check;
+    const JournalFigures f = journal_figures(*size);
+    if (f.rounds == 0 || f.rounds != size->replace.size())
+        return check;
+    const double share = f.journal_s / f.install_s * 100.0;
+    check.measured = format("%.2f%% (%.3f s of %.2f s)", share, f.journal_s, f.install_s);
+    check.holds = share < 3.0;
+    return check;
+}
+
+TargetCheck undo_gives_back(const Report& report) {
+    TargetCheck check{"undo gives the home back", kNotMeasured, false};
+    std::size_t runs = 0, given_back = 0;
+    for (const SizeRun& size : report.sizes) {
+        for (const ReplaceRun& r : size.replace) {
+            ++runs;
+            if (r.home_given_back())
+                ++given_back;
+        }
+    }
+    if (runs == 0)
+        return check;
+    check.measured = std::to_string(given_back) + " of " + std::to_string(runs) +
+                     " undos: exit 0 and the same files and bytes as before the installation";
+    check.holds = given_back == runs;
+    return check;
+}
+
+std::string journal_row(const SizeRun& size) {
+    std::string row = "| " + size.name + " | " + std::to_string(size.replace.size()) + " | ";
+    std::vector<double> install, undo;
+    long copied = -1;
+    int install_code = 0, undo_code = 0;
+    std::size_t given_back = 0;
+    std::string difference;
+    for (const ReplaceRun& r : size.replace) {
+        install.push_back(r.install.wall_s);
+        undo.push_back(r.undo.wall_s);
+        copied = r.files_copied;
+        if (r.install.exit_code != 0)
+            install_code = r.install.exit_code;
+        if (r.undo.exit_code != 0)
+            undo_code = r.undo.exit_code;
+        if (r.home_given_back())
+            ++given_back;
+        else if (difference.empty() && r.undo_differences > 0)
+            difference = std::to_string(r.undo_differences) + " files differ, e.g. " +
+                         r.first_undo_difference;
+    }
+    const std::size_t prepared = size.replace.empty() ? 0 : size.replace.back().files_prepared;
+    row += std::to_string(prepared) + " | " + (copied < 0 ? "" : std::to_string(copied)) + " | ";
+    if (install_code != 0)
+        row += "FAILED (exit " + std::to_string(install_code) + ") ";
+    row += format("%.2f", summarize(install).median) + " | ";
+    const JournalFigures f = journal_figures(size);
+    row += f.rounds == 0 ? "not read"
+                         : format("%.3f (%.2f%%)", f.journal_s, f.journal_s / f.install_s * 100.0);
+    row += " | " + format("%.2f", summarize(undo).median) + " | " + std::to_string(undo_code) +
+           " | " + (given_back == size.replace.size() ? "yes" : "NO") +
+           (difference.empty() ? "" : " (" + difference + ")") + " |\n";
+    return row;
+}
+
 std::string seconds_cell(const Summary& s) {
     return format("%.2f", s.median);
 }
 
 std::string contestant_row(const SizeRun& size, const ContestantRun& run) {
-    static const char* const kNames[] = {"A tool", "B shell way", "C floor"};
-    const char* label = kNames[run.id == 'A' ? 0 : run.id == 'B' ? 1 : 2];
+    static const char* const kNames[] = {"A tool", "B shell way", "C floor", "A's preview (-n)"};
+    const char* label = kNames[run.id == 'A' ? 0 : run.id == 'B' ? 1 : run.id == 'C' ? 2 : 3];
     std::string row = "| " + size.name + " | " + label + " | ";
     if (run.samples.empty())
         return row + "not run | | | | | | |\n";
@@ -158,7 +262,10 @@ std::string contestant_row(const SizeRun& size, const ContestantRun& run) {
     }
     row += seconds_cell(wall) + " | " +
            format("%.2f–%.2f (%.0f%%)", wall.min, wall.max, spread_percent(wall));
-    row += " | " + format("%.0f", static_cast<double>(size.work.file_copies) / wall.median);
+    // A preview copies nothing: no rate of copies for it.
+    row += " | " + (run.id == 'P'
+                        ? std::string()
+                        : format("%.0f", static_cast<double>(size.work.file_copies) / wall.median));
     row += " | " + format("%.2f", run.cpu().median);
     if (run.id == 'A' && run.tool_cpu().count > 0) {
         const Summary tool = run.tool_cpu();
@@ -178,7 +285,10 @@ std::vector<TargetCheck> check_targets(const Report& report) {
             peak_memory(report),
             linear_cost(report),
             robust(report, "deep", "a tree 200 directories deep installs without error"),
-            robust(report, "wide", "a directory of 20,000 files installs without error")};
+            robust(report, "wide", "a directory of 20,000 files installs without error"),
+            preview_share(report),
+            journal_share(report),
+            undo_gives_back(report)};
 }
 
 std::string render_markdown(const Report& report) {
@@ -229,6 +339,25 @@ std::string render_markdown(const Report& report) {
         out += contestant_row(size, size.a);
         out += contestant_row(size, size.b);
         out += contestant_row(size, size.c);
+        out += contestant_row(size, size.preview);
+    }
+
+    out += "\n## Journal and undo\n\n";
+    out +=
+        "Each round, a fresh home first gets every file of the image with other bytes (C's "
+        "copies, then one byte appended to each file they wrote); A installs there and replaces "
+        "them, keeping each old version in its journal by a hard link, and `zr7inst -u -h HOME` "
+        "then undoes that installation. The journal time is the one the log's closing line "
+        "gives; the home is given back when the undo ends with 0 and every file outside "
+        "`logs`, `.zr7inst`, `.archive` and `qdsload.catalog` has the bytes it had before A "
+        "(the same files and directories, no more). Times are medians over the rounds.\n\n";
+    out +=
+        "| size | rounds | files prepared | files copied by A | A there, wall s | journal s (% of "
+        "that wall) | undo wall s | undo exit | home given back |\n"
+        "|---|---|---|---|---|---|---|---|---|\n";
+    for (const SizeRun& size : report.sizes) {
+        if (!size.replace.empty())
+            out += journal_row(size);
     }
 
     out += "\n## Targets\n\n| target | measured | holds |\n|---|---|---|\n";

@@ -30,12 +30,32 @@ struct ContestantRun {
     double peak_rss_mib() const;  // the largest of all samples, -1 when none has it
 };
 
+// One round of the journal's test: A on a home that already holds every
+// file of the image with other bytes, so that it replaces them all (and
+// keeps each old version in its journal), then the undo of that run.
+struct ReplaceRun {
+    std::size_t files_prepared = 0;  // files written into the home beforehand
+    Sample install;                  // A there
+    long files_copied = -1;          // from the log's closing line; -1 when it was not read
+    double journal_s = -1;           // the same; -1 when it was not read
+    Sample undo;                     // `zr7inst -u -h HOME`
+    // Files whose bytes after the undo differ from those before A, or that
+    // one of the two walks lacks; -1 when not compared.
+    long undo_differences = -1;
+    std::string first_undo_difference;
+
+    bool journal_read() const { return install.exit_code == 0 && journal_s >= 0; }
+    bool home_given_back() const { return undo.exit_code == 0 && undo_differences == 0; }
+};
+
 struct SizeRun {
     std::string name;
     std::size_t image_files = 0;
     std::uint64_t image_bytes = 0;
     WorkCount work;
     ContestantRun a{'A', {}}, b{'B', {}}, c{'C', {}};
+    ContestantRun preview{'P', {}};  // `zr7inst -n` on the fresh home A then installs into
+    std::vector<ReplaceRun> replace;
     // Files whose installed bytes differ between the tool and the shell way
     // after their first round; -1 when they could not be compared.
     long differences = -1;

@@ -89,4 +89,16 @@ TreeDifference compare_digests(const TreeDigest& a, const TreeDigest& b) {
     return diff;
 }
 
+std::vector<std::string> written_files(const TreeDigest& before, const TreeDigest& after) {
+    std::vector<std::string> paths;
+    for (const auto& entry : after) {
+        if (!entry.first.empty() && entry.first.back() == '/')
+            continue;
+        auto old = before.find(entry.first);
+        if (old == before.end() || old->second != entry.second)
+            paths.push_back(entry.first);
+    }
+    return paths;
+}
+
 }  // namespace zr7bench

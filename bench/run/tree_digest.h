@@ -25,4 +25,8 @@ struct TreeDifference {
 };
 TreeDifference compare_digests(const TreeDigest& a, const TreeDigest& b);
 
+// The files of `after` that `before` lacks or holds with other bytes: what a
+// copy between the two walks wrote (directories left out), in sorted order.
+std::vector<std::string> written_files(const TreeDigest& before, const TreeDigest& after);
+
 }  // namespace zr7bench
