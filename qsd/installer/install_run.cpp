@@ -62,15 +62,9 @@ int Installer610::go() {
     // Two installations into one server take turns: their copies would race
     // for the same files, and each must see the other's VXAENV. A preview
     // writes nothing and takes no lock.
-    // The lock reports its own wait and why it gave up.
     std::unique_ptr<zr7::DirectoryLock> run_lock;
-    if (!preview) {
-        run_lock = std::make_unique<zr7::DirectoryLock>(home_path);
-        if (run_lock->failure() == zr7::kStatusInterrupted)
-            ZR7_RETURN(interrupted());
-        if (run_lock->failure() != 0)
-            ZR7_RETURN(run_lock->failure());
-    }
+    if (const int status = take_run_lock(run_lock))
+        ZR7_RETURN(status);
     if (copying == 0)
         ZR7_DETAIL("Copying disabled");
     if (seeding == 0)
@@ -126,6 +120,16 @@ int Installer610::process_commands(CommandList& commands) {
             ZR7_RETURN(status);
     }
     ZR7_RETURN(0);
+}
+
+int Installer610::take_run_lock(std::unique_ptr<zr7::DirectoryLock>& lock) {
+    if (preview)
+        return 0;
+    // The lock reports its own wait and why it gave up.
+    lock = std::make_unique<zr7::DirectoryLock>(home_path);
+    if (lock->failure() == zr7::kStatusInterrupted)
+        return interrupted();
+    return lock->failure();
 }
 
 int Installer610::begin_run_dir(bool with_journal) {

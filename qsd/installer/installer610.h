@@ -12,6 +12,7 @@
 #include "qsd/installer/journal.h"
 #include "qsd/installer/run_observer.h"
 #include "qsd/installer/simple_command.h"
+#include "qsd/platform/directory_lock.h"
 #include "qsd/platform/fs.h"
 #include "qsd/text/dictionary.h"
 #include "qsd/text/plan.h"
@@ -93,6 +94,9 @@ class Installer610 : public zr7::ActionSink {
                   bool check_only);
     int tree_copy(const std::string& src_template, const std::string& dst_template,
                   const std::string& options, bool check_only);
+    // Takes the run lock of the installation (none in a preview): 0, or the
+    // status of a run that could not take it.
+    int take_run_lock(std::unique_ptr<zr7::DirectoryLock>& lock);
     // Opens the installation's run store and this run's directory in it
     // (run_dir, run_id), with a journal for an installing run; removes the
     // run directories past the newest kKeptJournals journals first. 0, or a

@@ -15,7 +15,6 @@
 #include "qsd/envfile/backup.h"
 #include "qsd/installer/installer610.h"
 #include "qsd/installer/run_store.h"
-#include "qsd/platform/directory_lock.h"
 #include "qsd/platform/interruption.h"
 #include "qsd/platform/status.h"
 #include "qsd/platform/trace.h"
@@ -31,6 +30,36 @@ struct PathHistory {
     bool installed = false;
     zr7::ContentDigest digest;  // the bytes the run left, when installed
 };
+
+// A journal read back: the paths in the order the run first touched them,
+// and the SQL files it gave the loader.
+struct History {
+    std::map<std::string, PathHistory> paths;
+    zr7::StringList order;
+    zr7::StringList seeded;
+};
+
+History read_history(const std::string& text) {
+    History history;
+    for (const zr7::JournalEntry& entry : zr7::parse_journal(text)) {
+        if (entry.kind == "seed") {
+            history.seeded.push_back(entry.path);
+            continue;
+        }
+        if (entry.kind == "backup")
+            continue;
+        PathHistory& path = history.paths[entry.path];
+        if (entry.kind == "installed") {
+            path.installed = true;
+            path.digest = entry.digest;
+        } else if (path.first.empty()) {
+            path.first = entry.kind;
+            path.kept = entry.kept;
+            history.order.push_back(entry.path);
+        }
+    }
+    return history;
+}
 
 std::string dir_part(const std::string& path) {
     const std::size_t slash = path.find_last_of('/');
@@ -55,21 +84,50 @@ bool digest_of(int dir, const std::string& name, zr7::ContentDigest& out, struct
            zr7::digest_file(file.get(), false, out) == 0;
 }
 
+std::string read_text(int dir, const std::string& name) {
+    zr7::fs::UniqueFd file;
+    struct stat ignored {};
+    std::string text;
+    (void)(zr7::fs::open_read(dir, name, file, ignored) == 0 &&
+           zr7::fs::read_all(file.get(), text) == 0);
+    return text;
+}
+
+// Puts the kept version of a file back: renamed into place, or, kept by a
+// copy on another file system, copied back whole with its attributes.
+int put_back(int kept_dir, const std::string& kept, int dir, const std::string& name, bool sync) {
+    int error = zr7::fs::rename_at(kept_dir, kept, dir, name);
+    if (error == EXDEV) {
+        zr7::fs::UniqueFd file;
+        struct stat st {};
+        std::string content;
+        zr7::fs::AtomicReplace back(dir, name, sync);
+        error = zr7::fs::open_read(kept_dir, kept, file, st);
+        if (error == 0)
+            error = zr7::fs::read_all(file.get(), content);
+        if (error == 0)
+            error = back.open();
+        if (error == 0)
+            error = zr7::fs::write_all(back.fd(), content);
+        if (error == 0)
+            error = back.commit_like(st);
+        if (error == 0)
+            (void)zr7::fs::remove_file(kept_dir, kept);
+    }
+    if (error == 0 && sync)
+        error = zr7::fs::sync_fd(dir);
+    return error;
+}
+
 }  // namespace
 
 int Installer610::undo() {
     ZR7_OPERATION("Installer610::undo");
     plan = zr7::Plan(zr7::PlanKind::kUndo);
     std::unique_ptr<zr7::DirectoryLock> run_lock;
-    if (!preview) {
-        run_lock = std::make_unique<zr7::DirectoryLock>(home_path);
-        if (run_lock->failure() == zr7::kStatusInterrupted)
-            ZR7_RETURN(interrupted());
-        if (run_lock->failure() != 0)
-            ZR7_RETURN(run_lock->failure());
-    }
+    if (const int status = take_run_lock(run_lock))
+        ZR7_RETURN(status);
     error_mark = error_lines.size();
-    int status_of_start = 0;
     const std::string home = symbols.find("HOMEPATH") != nullptr ? *symbols.find("HOMEPATH") : "";
     const std::string store_path = home + "/" + zr7::kRunStoreName;
 
@@ -89,16 +147,14 @@ int Installer610::undo() {
         ZR7_ERROR("Error: <%s>: %s", store_path.c_str(), zr7::fs::error_text(error).c_str());
         ZR7_RETURN(zr7::kStatusCannotWrite);
     }
-    if (error == 0) {
-        const zr7::StringList ids = zr7::run_ids(store.get());
-        for (std::size_t i = ids.size(); i-- > 0 && id.empty();) {
-            zr7::fs::UniqueFd candidate;
-            if (zr7::fs::open_dir_below(store.get(), ids[i], candidate) == 0 &&
-                zr7::fs::stat_at(candidate.get(), zr7::kJournalFile, st) == 0 &&
-                zr7::fs::stat_at(candidate.get(), kUndoneMark, st) != 0) {
-                id = ids[i];
-                run = std::move(candidate);
-            }
+    const zr7::StringList ids = error == 0 ? zr7::run_ids(store.get()) : zr7::StringList();
+    for (std::size_t i = ids.size(); i-- > 0 && id.empty();) {
+        zr7::fs::UniqueFd candidate;
+        if (zr7::fs::open_dir_below(store.get(), ids[i], candidate) == 0 &&
+            zr7::fs::stat_at(candidate.get(), zr7::kJournalFile, st) == 0 &&
+            zr7::fs::stat_at(candidate.get(), kUndoneMark, st) != 0) {
+            id = ids[i];
+            run = std::move(candidate);
         }
     }
     if (id.empty()) {
@@ -107,11 +163,13 @@ int Installer610::undo() {
     }
     ZR7_DETAIL("Undoing the run <%s>", id.c_str());
     undone_run = id;
-    if (!preview && (status_of_start = begin_run_dir(false)) != 0)
-        ZR7_RETURN(status_of_start);
+    if (!preview) {
+        if (const int status = begin_run_dir(false))
+            ZR7_RETURN(status);
+    }
 
-    zr7::fs::UniqueFd journal_file;
     zr7::fs::UniqueFd kept_dir;
+    zr7::fs::UniqueFd journal_file;
     std::string text;
     error = zr7::fs::open_read(run.get(), zr7::kJournalFile, journal_file, st);
     if (error == 0)
@@ -119,122 +177,72 @@ int Installer610::undo() {
     if (error == 0)
         error = zr7::fs::open_dir_below(run.get(), zr7::kKeptDir, kept_dir);
     if (error != 0) {
-        const std::string shown = store_path + "/" + id + "/" + zr7::kJournalFile;
+        const std::string shown = store_path + "/" + id;
         ZR7_ERROR("Error: Can't open <%s>", shown.c_str());
         ZR7_ERROR("Error: <%s>: %s", shown.c_str(), zr7::fs::error_text(error).c_str());
         ZR7_RETURN(zr7::kStatusCannotWrite);
     }
 
-    // What the journal says, path by path, in the order the run first
-    // touched them; undone in the opposite order.
-    std::map<std::string, PathHistory> history;
-    zr7::StringList order;
-    zr7::StringList seeded;
-    for (const zr7::JournalEntry& entry : zr7::parse_journal(text)) {
-        if (entry.kind == "seed") {
-            seeded.push_back(entry.path);
-            continue;
-        }
-        if (entry.kind == "backup")
-            continue;
-        PathHistory& path = history[entry.path];
-        if (entry.kind == "installed") {
-            path.installed = true;
-            path.digest = entry.digest;
-        } else if (path.first.empty()) {
-            path.first = entry.kind;
-            path.kept = entry.kept;
-            order.push_back(entry.path);
-        }
-    }
-
+    History history = read_history(text);
     int conflicts = 0;
     int status = 0;
     std::set<std::string> removed;  // what this undo removed, or would
-    for (std::size_t i = order.size(); i-- > 0 && status == 0;) {
+    // Undone in the opposite order: a directory after what the run put in it.
+    for (std::size_t i = history.order.size(); i-- > 0 && status == 0;) {
         if (!preview && zr7::interruption() != 0)
             ZR7_RETURN(interrupted());
-        const std::string& relative = order[i];
-        const PathHistory& path = history[relative];
+        const std::string& relative = history.order[i];
+        const PathHistory& path = history.paths[relative];
         const std::string shown = home + "/" + relative;
         const std::string name = name_part(relative);
         zr7::fs::UniqueFd dir;
         if (zr7::fs::open_dir_below(home_fd.get(), dir_part(relative), dir) != 0)
             continue;  // gone with its directory: nothing left to take back
+        zr7::ContentDigest now;
+        struct stat now_st {};
+        const bool present = digest_of(dir.get(), name, now, now_st);
+        const bool as_installed = !path.installed || (present && now == path.digest);
+        zr7::ContentDigest old;
+        struct stat old_st {};
+        const bool kept = path.first == "replace" && is_kept_name(path.kept) &&
+                          digest_of(kept_dir.get(), path.kept, old, old_st);
+        zr7::Action action = zr7::Action::kRestore;
         if (path.first == "mkdir") {
             zr7::StringList inside;
             zr7::fs::UniqueFd made;
+            // Gone, or holding what others put there: left.
             if (zr7::fs::stat_at(dir.get(), name, st) != 0 || !S_ISDIR(st.st_mode) ||
                 zr7::fs::open_dir_below(dir.get(), name, made) != 0 ||
                 zr7::list_names(made.get(), inside) != 0 ||
                 std::any_of(inside.begin(), inside.end(), [&](const std::string& entry) {
                     return removed.count(relative + "/" + entry) == 0;  // a preview's
                 })) {
-                continue;  // gone, or holding what others put there
-            }
-            if (!preview && (error = zr7::fs::remove_dir(dir.get(), name)) != 0) {
-                ZR7_ERROR("Error: Can't remove <%s>", shown.c_str());
-                ZR7_ERROR("Error: <%s>: %s", shown.c_str(), zr7::fs::error_text(error).c_str());
-                status = zr7::kStatusCopyFailed;
-                break;
-            }
-            removed.insert(relative);
-            on_action(zr7::Action::kRmdir, shown, "");
-            continue;
-        }
-        zr7::ContentDigest now;
-        struct stat now_st {};
-        const bool present = digest_of(dir.get(), name, now, now_st);
-        const bool as_installed = !path.installed || (present && now == path.digest);
-        if (path.first == "create") {
-            if (!present && zr7::fs::stat_at(dir.get(), name, st) != 0)
-                continue;  // removed already
-            if (!present || !as_installed) {
-                ZR7_DETAIL("Changed since the installation: <%s>", shown.c_str());
-                on_action(zr7::Action::kConflict, shown, "");
-                ++conflicts;
                 continue;
             }
-            if (!preview && (error = zr7::fs::remove_file(dir.get(), name)) != 0) {
-                ZR7_ERROR("Error: Can't remove <%s>", shown.c_str());
-                ZR7_ERROR("Error: <%s>: %s", shown.c_str(), zr7::fs::error_text(error).c_str());
-                status = zr7::kStatusCopyFailed;
-                break;
-            }
-            removed.insert(relative);
-            on_action(zr7::Action::kRemove, shown, "");
-            continue;
-        }
-        // A replaced file: its kept version goes back, unless it is back
-        // already (the kept file gone, or the same bytes in place).
-        zr7::ContentDigest old;
-        struct stat old_st {};
-        if (!is_kept_name(path.kept) || !digest_of(kept_dir.get(), path.kept, old, old_st))
-            continue;
-        if (present && now == old) {
+            action = zr7::Action::kRmdir;
+        } else if (path.first == "create") {
+            if (!present && zr7::fs::stat_at(dir.get(), name, st) != 0)
+                continue;  // removed already
+            action = zr7::Action::kRemove;
+        } else if (!kept) {
+            continue;  // put back already
+        } else if (present && now == old) {
+            // Put back by a copy that was killed before it removed the kept file.
             if (!preview)
                 (void)zr7::fs::remove_file(kept_dir.get(), path.kept);
             continue;
         }
-        if (!present || !as_installed) {
+        if (action != zr7::Action::kRmdir && (!present || !as_installed)) {
             ZR7_DETAIL("Changed since the installation: <%s>", shown.c_str());
             on_action(zr7::Action::kConflict, shown, "");
             ++conflicts;
             continue;
         }
-        const bool env_file = name == "VXAENV";
-        std::string before_text;
-        std::string old_text;
+        const bool env_file = action == zr7::Action::kRestore && name == "VXAENV";
+        const std::string before_text = env_file ? read_text(dir.get(), name) : "";
         if (env_file) {
             // The environment file as it is now is backed up first, under a
             // name no backup has.
-            zr7::fs::UniqueFd current;
-            zr7::fs::UniqueFd kept;
-            struct stat ignored {};
-            (void)(zr7::fs::open_read(dir.get(), name, current, ignored) == 0 &&
-                   zr7::fs::read_all(current.get(), before_text) == 0);
-            (void)(zr7::fs::open_read(kept_dir.get(), path.kept, kept, ignored) == 0 &&
-                   zr7::fs::read_all(kept.get(), old_text) == 0);
             std::string backup;
             const std::string dir_shown = home + "/" + dir_part(relative);
             if (preview) {
@@ -248,42 +256,31 @@ int Installer610::undo() {
             }
             on_action(zr7::Action::kBackup, backup, "");
         }
+        const std::string old_text = env_file ? read_text(kept_dir.get(), path.kept) : "";
         if (!preview) {
-            error = zr7::fs::rename_at(kept_dir.get(), path.kept, dir.get(), name);
-            if (error == EXDEV) {
-                // Kept by a copy on another file system: copied back whole.
-                zr7::fs::UniqueFd kept;
-                std::string content;
-                zr7::fs::AtomicReplace back(dir.get(), name, env_file);
-                error = zr7::fs::open_read(kept_dir.get(), path.kept, kept, old_st);
-                if (error == 0)
-                    error = zr7::fs::read_all(kept.get(), content);
-                if (error == 0)
-                    error = back.open();
-                if (error == 0)
-                    error = zr7::fs::write_all(back.fd(), content);
-                if (error == 0)
-                    error = back.commit_like(old_st);
-                if (error == 0)
-                    (void)zr7::fs::remove_file(kept_dir.get(), path.kept);
-            }
-            if (error == 0 && env_file)
-                error = zr7::fs::sync_fd(dir.get());
+            error = action == zr7::Action::kRmdir ? zr7::fs::remove_dir(dir.get(), name)
+                    : action == zr7::Action::kRemove
+                        ? zr7::fs::remove_file(dir.get(), name)
+                        : put_back(kept_dir.get(), path.kept, dir.get(), name, env_file);
             if (error != 0) {
-                ZR7_ERROR("Error: Can't restore <%s>", shown.c_str());
+                ZR7_ERROR(action == zr7::Action::kRestore ? "Error: Can't restore <%s>"
+                                                          : "Error: Can't remove <%s>",
+                          shown.c_str());
                 ZR7_ERROR("Error: <%s>: %s", shown.c_str(), zr7::fs::error_text(error).c_str());
                 status = zr7::kStatusCopyFailed;
                 break;
             }
         }
+        if (action != zr7::Action::kRestore)
+            removed.insert(relative);
         if (env_file)
             on_action(zr7::Action::kVxaenv, shown,
                       zr7::unified_diff(before_text, old_text, "VXAENV"));
         else
-            on_action(zr7::Action::kRestore, shown, "");
+            on_action(action, shown, "");
     }
     if (status == 0) {
-        for (const std::string& relative : seeded)
+        for (const std::string& relative : history.seeded)
             on_action(zr7::Action::kSeeded, home + "/" + relative, "");
         // The run is undone, as far as it can be: the next undo goes on with
         // the installation before it.

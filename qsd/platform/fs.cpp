@@ -453,14 +453,7 @@ int AtomicReplace::adopt_attributes(mode_t new_mode, mode_t add_bits) {
 int AtomicReplace::commit(mode_t new_mode, mode_t add_bits) {
     if (const int failed = adopt_attributes(new_mode, add_bits))
         return failed;
-    if (const int failed = sync_scratch())
-        return failed;
-    if (::renameat(dir_, scratch_.c_str(), dir_, name_.c_str()) != 0)
-        return errno;
-    scratch_.clear();
-    if (sync_ && ::fsync(dir_) != 0)
-        return errno;
-    return 0;
+    return put_in_place();
 }
 
 int AtomicReplace::commit_like(const struct stat& like) {
@@ -469,6 +462,10 @@ int AtomicReplace::commit_like(const struct stat& like) {
         return errno;
     if (::fchmod(fd, like.st_mode & 07777) != 0)
         return errno;
+    return put_in_place();
+}
+
+int AtomicReplace::put_in_place() {
     if (const int failed = sync_scratch())
         return failed;
     if (::renameat(dir_, scratch_.c_str(), dir_, name_.c_str()) != 0)

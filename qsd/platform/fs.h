@@ -159,6 +159,9 @@ class AtomicReplace {
     int sync_scratch();
 
   private:
+    // Flushes (when asked) and renames the scratch file over the name.
+    int put_in_place();
+
     int dir_;
     std::string name_;
     bool sync_;
