@@ -2,6 +2,7 @@
 // installation directory and the relaunch under logging.
 #pragma once
 
+#include <cstdio>
 #include <string>
 
 #include "qsd/driver/progress.h"
@@ -67,8 +68,10 @@ std::string run_record_json(const RunRecord& record);
 // The local time as "2026-12-07T01:45:09+0000".
 std::string iso_local_time(long seconds_since_epoch);
 
-// MARLIN_HOME, else MARLINHOME, else "."; always ending in "/".
-std::string get_home_path();
+// MARLIN_HOME, else MARLINHOME, else "."; always ending in "/". The line
+// that says which goes to `out`: standard output, or standard error in a
+// preview, whose standard output is the plan alone.
+std::string get_home_path(std::FILE* out = stdout);
 
 // The log directory of a home directory: the home itself when it is "./",
 // else home + "logs/".

@@ -7,17 +7,17 @@
 
 namespace zr7 {
 
-std::string get_home_path() {
+std::string get_home_path(std::FILE* out) {
     std::string home;
     const char* value = PLT1_GetEnv("MARLIN_HOME", nullptr);
     if (value != nullptr && *value != '\0') {
-        std::printf("MARLIN_HOME is <%s>\n", escape_controls(value).c_str());
+        std::fprintf(out, "MARLIN_HOME is <%s>\n", escape_controls(value).c_str());
         home = value;
     } else if ((value = PLT1_GetEnv("MARLINHOME", nullptr)) != nullptr && *value != '\0') {
-        std::printf("MARLINHOME is <%s>\n", escape_controls(value).c_str());
+        std::fprintf(out, "MARLINHOME is <%s>\n", escape_controls(value).c_str());
         home = value;
     } else {
-        std::printf("No MARLIN_HOME or MARLINHOME found.  Defaulting to .");
+        std::fputs("No MARLIN_HOME or MARLINHOME found.  Defaulting to .", out);
         home = ".";
     }
     home = strip(home, ' ', StripEnd::kTrailing);

@@ -152,7 +152,7 @@ int run_main(int argc, char** argv) {
     }
 
     if (home.empty())
-        home = get_home_path();
+        home = get_home_path(preview ? stderr : stdout);
     if (home.back() != '/')
         home += '/';
 
