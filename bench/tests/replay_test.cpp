@@ -84,7 +84,7 @@ TEST(BuildReplay, PlansAndTheirPrograms) {
           "tr /i/MSRV/ax/TABLE/TECLIB/t.cat /h/tables/S/TECLIB/t.cat"},
          ""},
         {"a kept file starts nothing; a T tree strips",
-         "create /h/ax/ms/bin/run\nkeep /h/tables/S/site.cfg\ncreate /h/tables/S/doc.txt\n",
+         "keep /h/tables/S/site.cfg\ncreate /h/ax/ms/bin/run\ncreate /h/tables/S/doc.txt\n",
          {"cp /i/MSRV/ax/bin/run /h/ax/ms/bin/run",
           "tr /i/MSRV/ax/TABLE_TXT/doc.txt "
           "/h/tables/S/doc.txt"},
