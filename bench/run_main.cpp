@@ -1,9 +1,9 @@
-// zr7bench_run: times the tool against the shell way and the floor on
+// zr7bench_run: times the tool against the shell way and the two floors on
 // synthetic installations of three sizes, checks that a very deep tree and a
 // very large directory install, and writes the results page.
 //
 //   zr7bench_run [--sizes small,default,large] [--rounds 5] [--seed N]
-//                [--contestants A,B,C] [--bin DIR] [--script FILE] [--work DIR]
+//                [--contestants A,B,C,D] [--bin DIR] [--script FILE] [--work DIR]
 //                [--out FILE] [--plot FILE|none] [--no-limits] [--keep]
 //
 // With A, each round also times A's preview, and A and its undo on a home
@@ -27,6 +27,7 @@
 #include <cstring>
 #include <ctime>
 #include <fstream>
+#include <set>
 #include <sstream>
 #include <string>
 #include <vector>
@@ -49,7 +50,7 @@ struct Options {
     std::vector<std::string> sizes{"small", "default", "large"};
     int rounds = 5;
     std::uint64_t seed = 20261206;
-    std::string contestants = "ABC";  // the letters of those that run
+    std::string contestants = "ABCD";  // the letters of those that run
     std::string bin_dir;
     std::string script = std::string(ZR7_SOURCE_DIR) + "/bench/shell_install.sh";
     std::string work;
@@ -62,7 +63,7 @@ struct Options {
 [[noreturn]] void usage() {
     std::fprintf(stderr,
                  "usage: zr7bench_run [--sizes small,default,large] [--rounds N] [--seed N]\n"
-                 "                    [--contestants A,B,C] [--bin DIR] [--script FILE]\n"
+                 "                    [--contestants A,B,C,D] [--bin DIR] [--script FILE]\n"
                  "                    [--work DIR] [--out FILE] [--plot FILE|none]\n"
                  "                    [--no-limits] [--keep]\n");
     std::exit(2);
@@ -141,7 +142,7 @@ Options parse(int argc, char** argv) {
         } else if (arg == "--contestants" && has_value) {
             o.contestants.clear();
             for (const std::string& id : split(argv[++i], ',')) {
-                if (id != "A" && id != "B" && id != "C")
+                if (id != "A" && id != "B" && id != "C" && id != "D")
                     usage();
                 if (o.contestants.find(id) == std::string::npos)
                     o.contestants += id;
@@ -174,6 +175,10 @@ Options parse(int argc, char** argv) {
         o.bin_dir = dir_of_self();
     if (o.work.empty())
         o.work = default_work_root() + "/zr7bench." + std::to_string(::getpid());
+    // Absolute, as the tool's plan shows the home: D's list is read from it.
+    char cwd[4096];
+    if (o.work[0] != '/' && ::getcwd(cwd, sizeof cwd) != nullptr)
+        o.work = std::string(cwd) + "/" + o.work;
     return o;
 }
 
@@ -234,6 +239,8 @@ Bench make_bench(const Options& o) {
     b.env.push_back("PATH=" + b.path_value);
     b.bash = find_program("bash", b.path_value);
     b.cp = find_program("cp", b.path_value);
+    b.tr = find_program("tr", b.path_value);
+    b.qdsload = o.bin_dir + "/qdsload";
     return b;
 }
 
@@ -249,8 +256,8 @@ void check_setup(const Bench& b) {
     }
     if (::access(b.script.c_str(), R_OK) != 0)
         fail_setup(b.script + " is missing");
-    if (b.bash.empty() || b.cp.empty())
-        fail_setup("bash or cp is not on PATH");
+    if (b.bash.empty() || b.cp.empty() || b.tr.empty())
+        fail_setup("bash, cp or tr is not on PATH");
 }
 
 // A fresh server home for one run: the old one removed, the new one written.
@@ -280,6 +287,10 @@ struct SizeCase {
     HomeOptions home;
     TreeDigest tool_digest;
     TreeDigest shell_digest;
+    TreeDigest replay_digest;
+    std::set<std::string> sources;  // the image's files, absolute: D's list is traced to them
+    ReplayList replay;              // D's list, made before D first runs
+    bool replay_made = false;
 };
 
 SizeCase prepare_size(const Options& o, const std::string& name) {
@@ -291,8 +302,10 @@ SizeCase prepare_size(const Options& o, const std::string& name) {
     gen.seed = o.seed;
     const ImagePlan plan = plan_image(gen);
     run.image_files = plan.files.size();
-    for (const PlannedFile& f : plan.files)
+    for (const PlannedFile& f : plan.files) {
         run.image_bytes += f.size;
+        sc.sources.insert(o.work + "/" + name + "/image/" + f.path);
+    }
     run.work = count_work(plan, gen.arch);
 
     sc.c.label = name;
@@ -357,13 +370,24 @@ void run_replace_round(const Options& o, const Bench& b, int round, SizeCase& sc
     sc.run.replace.push_back(r);
 }
 
+// D's list, from A's preview on the fresh home D is about to replay into.
+void make_replay(SizeCase& sc, const Bench& b) {
+    if (sc.replay_made)
+        return;
+    sc.replay = plan_replay(b, sc.c, sc.sources);
+    sc.replay_made = true;
+    if (!sc.replay.error.empty())
+        std::fprintf(stderr, "[%s] D cannot replay the plan: %s\n", sc.run.name.c_str(),
+                     sc.replay.error.c_str());
+}
+
 // One round of one size: the contestants, each on a fresh home, in an order
 // that turns with the round; A's preview on A's fresh home just before A.
 void run_round(const Options& o, const Bench& b, int round, SizeCase& sc) {
     SizeRun& run = sc.run;
-    ContestantRun* order[] = {&run.a, &run.b, &run.c};
-    for (int k = 0; k < 3; ++k) {
-        ContestantRun* who = order[(round + k) % 3];
+    ContestantRun* order[] = {&run.a, &run.b, &run.c, &run.d};
+    for (int k = 0; k < 4; ++k) {
+        ContestantRun* who = order[(round + k) % 4];
         if (o.contestants.find(who->id) == std::string::npos)
             continue;
         fresh_home(sc.c, sc.home);
@@ -373,9 +397,12 @@ void run_round(const Options& o, const Bench& b, int round, SizeCase& sc) {
             std::fprintf(stderr, "[%s] round %d/%d: A's preview %.2f s (exit %d)\n",
                          run.name.c_str(), round + 1, o.rounds, p.wall_s, p.exit_code);
         }
+        if (who->id == 'D')
+            make_replay(sc, b);
         const Sample s = who->id == 'A'   ? run_tool(b, sc.c)
                          : who->id == 'B' ? run_shell_way(b, sc.c)
-                                          : run_floor(b, sc.c);
+                         : who->id == 'C' ? run_floor(b, sc.c)
+                                          : run_replay(b, sc.c, sc.replay);
         who->samples.push_back(s);
         std::fprintf(stderr, "[%s] round %d/%d: %c %.2f s (exit %d)\n", run.name.c_str(), round + 1,
                      o.rounds, who->id, s.wall_s, s.exit_code);
@@ -383,13 +410,23 @@ void run_round(const Options& o, const Bench& b, int round, SizeCase& sc) {
             sc.tool_digest = installed(sc.c);
         if (round == 0 && who->id == 'B')
             sc.shell_digest = installed(sc.c);
+        if (round == 0 && who->id == 'D')
+            sc.replay_digest = installed(sc.c);
     }
     if (round == 0 && run.a.all_succeeded() && run.b.all_succeeded()) {
         const TreeDifference diff = compare_digests(sc.tool_digest, sc.shell_digest);
         run.differences = diff.count;
         run.first_difference = diff.first;
+    }
+    if (round == 0 && run.a.all_succeeded() && run.d.all_succeeded()) {
+        const TreeDifference diff = compare_digests(sc.tool_digest, sc.replay_digest);
+        run.d_differences = diff.count;
+        run.first_d_difference = diff.first;
+    }
+    if (round == 0) {
         sc.tool_digest.clear();
         sc.shell_digest.clear();
+        sc.replay_digest.clear();
     }
     if (o.contestants.find('A') != std::string::npos)
         run_replace_round(o, b, round, sc);
@@ -474,7 +511,7 @@ std::string plot(const Options& o, const Bench& b, const Report& report) {
     std::ofstream d(data);
     for (const SizeRun& size : report.sizes) {
         d << size.work.file_copies << ' ' << size.a.wall().median << ' ' << size.b.wall().median
-          << ' ' << size.c.wall().median << '\n';
+          << ' ' << size.c.wall().median << ' ' << size.d.wall().median << '\n';
     }
     d.close();
     std::ofstream g(script);
@@ -483,12 +520,12 @@ std::string plot(const Options& o, const Bench& b, const Report& report) {
       << "set title 'Installation wall time (median of " << report.rounds << " rounds)'\n"
       << "set xlabel 'file copies'\nset ylabel 'seconds'\nset key left top\nset grid\n";
     // Only the contestants that ran: one left out has no times to draw.
-    const char* const lines[] = {"1:3 with linespoints title 'B shell way'",
-                                 "1:2 with linespoints title 'A tool'",
-                                 "1:4 with linespoints title 'C floor'"};
-    const char ids[] = {'B', 'A', 'C'};
+    const char* const lines[] = {
+        "1:3 with linespoints title 'B shell way'", "1:2 with linespoints title 'A tool'",
+        "1:5 with linespoints title 'D design floor'", "1:4 with linespoints title 'C floor'"};
+    const char ids[] = {'B', 'A', 'D', 'C'};
     std::string plots;
-    for (int k = 0; k < 3; ++k) {
+    for (int k = 0; k < 4; ++k) {
         if (o.contestants.find(ids[k]) != std::string::npos)
             plots +=
                 std::string(plots.empty() ? "plot " : ", ") + "'" + data + "' using " + lines[k];
@@ -539,7 +576,7 @@ int run(int argc, char** argv) {
 
     bool ok = static_cast<bool>(out);
     for (const SizeRun& size : report.sizes) {
-        for (const ContestantRun* who : {&size.a, &size.b, &size.c, &size.preview}) {
+        for (const ContestantRun* who : {&size.a, &size.b, &size.c, &size.d, &size.preview}) {
             const char id = who->id == 'P' ? 'A' : who->id;
             if (o.contestants.find(id) != std::string::npos)
                 ok = ok && who->all_succeeded();
@@ -548,6 +585,9 @@ int run(int argc, char** argv) {
         if (o.contestants.find('A') != std::string::npos &&
             o.contestants.find('B') != std::string::npos)
             ok = ok && size.differences == 0;
+        if (o.contestants.find('A') != std::string::npos &&
+            o.contestants.find('D') != std::string::npos)
+            ok = ok && size.d_differences == 0;
         for (const ReplaceRun& r : size.replace)
             ok = ok && r.install.exit_code == 0 && r.home_given_back();
     }

@@ -1,12 +1,17 @@
 #include "bench/run/contestants.h"
 
+#include <sys/stat.h>
 #include <unistd.h>
 
+#include <cerrno>
+#include <chrono>
 #include <fstream>
 #include <sstream>
 
+#include "bench/gen/write_tree.h"
 #include "bench/run/probe_record.h"
 #include "bench/run/spawn.h"
+#include "qsd/seeding/seed_texts.h"
 
 namespace zr7bench {
 
@@ -130,6 +135,97 @@ Sample run_floor(const Bench& bench, const Case& c) {
     return total;
 }
 
+ReplayList plan_replay(const Bench& bench, const Case& c, const std::set<std::string>& sources) {
+    const Sample preview = run_preview(bench, c);
+    const std::string plan = slurp(bench.work + "/" + c.label + ".preview.out");
+    if (preview.exit_code != 0) {
+        ReplayList failed;
+        failed.error = "the preview ended with " + std::to_string(preview.exit_code);
+        return failed;
+    }
+    RouteSetting setting;
+    setting.msrv = c.image + "/MSRV";
+    setting.home = c.home;
+    setting.server = c.server;
+    setting.arch = c.arch;
+    return build_replay(plan, copy_routes(build_command_list(true, true), setting), sources);
+}
+
+namespace {
+
+std::string host_name() {
+    char buffer[512] = {};
+    return ::gethostname(buffer, sizeof buffer - 1) == 0 ? buffer : "";
+}
+
+std::string dir_of(const std::string& path) {
+    return path.substr(0, path.rfind('/'));
+}
+
+std::string name_of(const std::string& path) {
+    return path.substr(path.rfind('/') + 1);
+}
+
+}  // namespace
+
+// The clock runs over the whole list, the runner's own work between the
+// programs included (a directory made, a response file written), as the
+// tool's own work between its programs counts in A.
+Sample run_replay(const Bench& bench, const Case& c, const ReplayList& list) {
+    Sample total;
+    if (!list.error.empty()) {
+        total.exit_code = 1;
+        return total;
+    }
+    const std::string host = host_name();
+    const std::string response = bench.work + "/" + c.label + ".D.rsp";
+    const std::string err = bench.work + "/" + c.label + ".D.err";
+    const std::string logs = c.home + "/logs/";
+    const auto start = std::chrono::steady_clock::now();
+    for (const ReplayStep& step : list.steps) {
+        SpawnSpec job;
+        job.env = bench.env;
+        job.stderr_path = err;
+        switch (step.kind) {
+            case StepKind::kMkdir:
+                if (::mkdir(step.to.c_str(), 0777) != 0 && errno != EEXIST)
+                    total.exit_code = 1;
+                continue;
+            case StepKind::kCopy:
+                job.argv = {bench.cp, "-f", "--", step.from, step.to};
+                break;
+            case StepKind::kStripCr:
+                job.argv = {bench.tr, "-d", "\r"};
+                job.stdin_path = step.from;
+                job.stdout_path = step.to;
+                break;
+            case StepKind::kLoad: {
+                const std::string name = name_of(step.to);
+                if (write_file(response,
+                               zr7::response_file_content(kBenchProtocol, host, kBenchPort, name),
+                               0600) != 0)
+                    total.exit_code = 1;
+                job.argv = {bench.qdsload};
+                job.env.push_back(std::string("KDC_FAMILIES=PORT:") + kBenchPort + " " +
+                                  kBenchProtocol + " USE:Y");
+                job.env.push_back("SQLLIB=" + dir_of(step.to));
+                job.env.push_back("VXA_TRC1=ERROR");
+                job.stdin_path = response;
+                job.stdout_path = zr7::seeding_log_path(logs, name);
+                job.stdout_append = true;
+                break;
+            }
+        }
+        const SpawnResult r = spawn_and_wait(job);
+        total.cpu_s += r.cpu_s;
+        if (total.exit_code == 0)
+            total.exit_code = r.exit_code;
+    }
+    total.wall_s = std::chrono::duration<double>(std::chrono::steady_clock::now() - start).count();
+    ::unlink(response.c_str());
+    return total;
+}
+
 std::vector<std::string> describe_contestants() {
     return {
         std::string("A, the tool as a user runs it, through the relaunch: `zr7inst -h HOME -c ") +
@@ -145,6 +241,15 @@ std::vector<std::string> describe_contestants() {
         "C, the floor: one `cp -a SRC/. DST` per command of the list (`cp -an` for the trees "
         "that keep existing files); no carriage returns removed, no environment file, no "
         "seeding.",
+        "D, the design's floor: the programs A starts, replayed one after the other with "
+        "nothing else: for each file A copies (each `create`, `replace` and `same` line of A's "
+        "preview on the fresh home, traced back to its source through the tool's command list) "
+        "one `cp -f -- SRC DST`, or `tr -d '\\r'` with standard input from SRC and standard "
+        "output to DST where A removes carriage returns; for each SQL file A seeds one "
+        "`qdsload` with the response file on its standard input and the seeding log on its "
+        "output; the directories A creates made in between by the runner (mkdir(2)). No "
+        "shell, no checks, no scratch files, no journal, no environment file. The preview and "
+        "the list are made before the clock starts.",
         std::string("A's preview: `zr7inst -n -h HOME -c ") + kBenchSetting + " -m " +
             kBenchModule +
             " IMAGE`, its plan written to a file, on the fresh home just before A installs there.",

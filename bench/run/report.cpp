@@ -76,6 +76,20 @@ TargetCheck ratio_to_shell(const Report& report) {
     return check;
 }
 
+// What the tool spends beyond the programs it has to start: A against the
+// same programs replayed bare, measured in the same rounds.
+TargetCheck ratio_to_design_floor(const Report& report) {
+    TargetCheck check{"A at most 1.15 x D on the default size", kNotMeasured, false};
+    const SizeRun* size = find_size(report, "default");
+    if (size == nullptr || !size->a.all_succeeded() || !size->d.all_succeeded())
+        return check;
+    const double ratio = size->a.wall().median / size->d.wall().median;
+    check.measured =
+        format("%.2f (A %.2f s, D %.2f s)", ratio, size->a.wall().median, size->d.wall().median);
+    check.holds = ratio <= 1.15;
+    return check;
+}
+
 TargetCheck own_cpu(const Report& report) {
     TargetCheck check{"tool's own CPU at most 5% of A's wall time (default size)", kNotMeasured,
                       false};
@@ -241,13 +255,27 @@ std::string journal_row(const SizeRun& size) {
     return row;
 }
 
+// The Sizes table's comparison of two contestants' installed bytes.
+std::string compared(long differences, const std::string& first) {
+    if (differences < 0)
+        return "not compared";
+    if (differences == 0)
+        return "same bytes installed";
+    return std::to_string(differences) + " files differ, e.g. " + first;
+}
+
 std::string seconds_cell(const Summary& s) {
     return format("%.2f", s.median);
 }
 
 std::string contestant_row(const SizeRun& size, const ContestantRun& run) {
-    static const char* const kNames[] = {"A tool", "B shell way", "C floor", "A's preview (-n)"};
-    const char* label = kNames[run.id == 'A' ? 0 : run.id == 'B' ? 1 : run.id == 'C' ? 2 : 3];
+    static const char* const kNames[] = {"A tool", "B shell way", "C floor", "D design floor",
+                                         "A's preview (-n)"};
+    const char* label = kNames[run.id == 'A'   ? 0
+                               : run.id == 'B' ? 1
+                               : run.id == 'C' ? 2
+                               : run.id == 'D' ? 3
+                                               : 4];
     std::string row = "| " + size.name + " | " + label + " | ";
     if (run.samples.empty())
         return row + "not run | | | | | | |\n";
@@ -281,6 +309,7 @@ std::string contestant_row(const SizeRun& size, const ContestantRun& run) {
 
 std::vector<TargetCheck> check_targets(const Report& report) {
     return {ratio_to_shell(report),
+            ratio_to_design_floor(report),
             own_cpu(report),
             peak_memory(report),
             linear_cost(report),
@@ -311,13 +340,10 @@ std::string render_markdown(const Report& report) {
     out += "## Sizes\n\n";
     out +=
         "| size | image files | image MiB | file copies | new directories | loader runs | "
-        "tool vs shell way |\n|---|---|---|---|---|---|---|\n";
+        "tool vs shell way | tool vs D |\n|---|---|---|---|---|---|---|---|\n";
     for (const SizeRun& size : report.sizes) {
-        std::string same =
-            size.differences < 0 ? "not compared"
-            : size.differences == 0
-                ? "same bytes installed"
-                : std::to_string(size.differences) + " files differ, e.g. " + size.first_difference;
+        const std::string same = compared(size.differences, size.first_difference) + " | " +
+                                 compared(size.d_differences, size.first_d_difference);
         out += "| " + size.name + " | " + std::to_string(size.image_files) + " | " +
                format("%.1f", static_cast<double>(size.image_bytes) / 1048576.0) + " | " +
                std::to_string(size.work.file_copies) + " | " +
@@ -339,6 +365,7 @@ std::string render_markdown(const Report& report) {
         out += contestant_row(size, size.a);
         out += contestant_row(size, size.b);
         out += contestant_row(size, size.c);
+        out += contestant_row(size, size.d);
         out += contestant_row(size, size.preview);
     }
 

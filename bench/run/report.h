@@ -20,7 +20,7 @@ struct Sample {
 };
 
 struct ContestantRun {
-    char id = '?';  // 'A' the tool, 'B' the shell way, 'C' the floor
+    char id = '?';  // 'A' the tool, 'B' the shell way, 'C' the floor, 'D' the design's floor
     std::vector<Sample> samples;
 
     bool all_succeeded() const;
@@ -53,13 +53,16 @@ struct SizeRun {
     std::size_t image_files = 0;
     std::uint64_t image_bytes = 0;
     WorkCount work;
-    ContestantRun a{'A', {}}, b{'B', {}}, c{'C', {}};
+    ContestantRun a{'A', {}}, b{'B', {}}, c{'C', {}}, d{'D', {}};
     ContestantRun preview{'P', {}};  // `zr7inst -n` on the fresh home A then installs into
     std::vector<ReplaceRun> replace;
     // Files whose installed bytes differ between the tool and the shell way
     // after their first round; -1 when they could not be compared.
     long differences = -1;
     std::string first_difference;
+    // The same between the tool and D's replay of its programs.
+    long d_differences = -1;
+    std::string first_d_difference;
 };
 
 struct RobustRun {

@@ -24,10 +24,13 @@ SpawnResult spawn_and_wait(const SpawnSpec& job) {
 
     posix_spawn_file_actions_t actions;
     posix_spawn_file_actions_init(&actions);
-    posix_spawn_file_actions_addopen(&actions, 0, "/dev/null", O_RDONLY, 0);
+    const std::string in = job.stdin_path.empty() ? "/dev/null" : job.stdin_path;
     const std::string out = job.stdout_path.empty() ? "/dev/null" : job.stdout_path;
     const std::string err = job.stderr_path.empty() ? "/dev/null" : job.stderr_path;
-    posix_spawn_file_actions_addopen(&actions, 1, out.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0644);
+    posix_spawn_file_actions_addopen(&actions, 0, in.c_str(), O_RDONLY, 0);
+    posix_spawn_file_actions_addopen(&actions, 1, out.c_str(),
+                                     O_WRONLY | O_CREAT | (job.stdout_append ? O_APPEND : O_TRUNC),
+                                     0644);
     posix_spawn_file_actions_addopen(&actions, 2, err.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0644);
 
     const auto start = std::chrono::steady_clock::now();

@@ -9,7 +9,9 @@ namespace zr7bench {
 struct SpawnSpec {
     std::vector<std::string> argv;  // argv[0] is an absolute path
     std::vector<std::string> env;   // NAME=value entries, the whole environment
+    std::string stdin_path;         // "" = /dev/null
     std::string stdout_path;        // "" = /dev/null
+    bool stdout_append = false;     // added to the end of stdout_path rather than replacing it
     std::string stderr_path;        // "" = /dev/null
 };
 

@@ -1,5 +1,6 @@
-// The targets of the preview, the journal and the undo, checked against
-// made-up runs, and the files a copy wrote between two walks of a home.
+// The targets of the design's floor, the preview, the journal and the undo,
+// checked against made-up runs, and the files a copy wrote between two walks
+// of a home.
 #include <gtest/gtest.h>
 
 #include <string>
@@ -66,6 +67,37 @@ TEST(PreviewTarget, ShareOfAsWallTime) {
             find_target(large_run(42.2, c.preview_s, c.exit_code, {}), "A's preview");
         EXPECT_EQ(check.measured, c.measured) << c.preview_s;
         EXPECT_EQ(check.holds, c.holds) << c.preview_s;
+    }
+}
+
+TEST(DesignFloorTarget, AOverDOnTheDefaultSize) {
+    struct Case {
+        std::vector<Sample> a;
+        std::vector<Sample> d;
+        const char* measured;
+        bool holds;
+    };
+    const Case cases[] = {
+        {{sample(11.5)}, {sample(10)}, "1.15 (A 11.50 s, D 10.00 s)", true},
+        {{sample(11.6)}, {sample(10)}, "1.16 (A 11.60 s, D 10.00 s)", false},
+        // Medians of each, taken in the same rounds.
+        {{sample(9), sample(12), sample(30)},
+         {sample(10), sample(11), sample(25)},
+         "1.09 (A 12.00 s, D 11.00 s)",
+         true},
+        {{sample(11)}, {sample(10, 1)}, "not measured", false},
+        {{sample(11)}, {}, "not measured", false},
+    };
+    for (const Case& c : cases) {
+        Report report;
+        SizeRun size;
+        size.name = "default";
+        size.a.samples = c.a;
+        size.d.samples = c.d;
+        report.sizes.push_back(size);
+        const TargetCheck check = find_target(report, "A at most 1.15 x D");
+        EXPECT_EQ(check.measured, c.measured);
+        EXPECT_EQ(check.holds, c.holds) << c.measured;
     }
 }
 
