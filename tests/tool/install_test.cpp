@@ -76,6 +76,8 @@ TEST(Install, ForeseenFailuresChangeNothing) {
         {"loop in the image", [](S s) {
              fs::create_directory_symlink("..", s.image + "/MSRV/lx8266/TABLE/sub/deeper/up"); },
          {"-m", "kzr"}, 251, "Error: Directory loop at <", {}},
+        {"no log directory", [](S s) { remove_tree(s.home + "/logs"); }, {}, 248,
+         "Error: Log directory <", {}},
         // The reason of the system follows a line that names none.
         {"no configuration", [](S s) { remove_tree(s.home + "/config"); }, {}, 2,
          "Error: Can't open kmsenv\nError: <", {}},
@@ -205,6 +207,7 @@ TEST(Install, NamesInTheImageCannotForgeALineOfTheLog) {
 
 TEST(Vxaenv, SettingsAndModuleRewriteItWithABackup) {
     SampleInstall s;
+    ::chmod(s.vxaenv.c_str(), 0640);
     ASSERT_EQ(install(s, {"-e", "-c", "kds_start=2", "-c", "NEW=v", "-m", "KZR"}).exit_code, 0);
     EXPECT_EQ(read_file(s.vxaenv),
               "# server environment\nKDS_START=2\nKDS_RUN=KDSMAIN;KDSTRACE;KZR\n"
@@ -213,6 +216,9 @@ TEST(Vxaenv, SettingsAndModuleRewriteItWithABackup) {
     ASSERT_EQ(backups.size(), 1u);
     EXPECT_TRUE(std::regex_match(backups[0], std::regex("VXAENV_[0-9]+"))) << backups[0];
     EXPECT_EQ(read_file(s.tables() + "/.archive/" + backups[0]), kSampleVxaenv);
+    struct stat backup {};  // the backup keeps the file's mode
+    ASSERT_EQ(::stat((s.tables() + "/.archive/" + backups[0]).c_str(), &backup), 0);
+    EXPECT_EQ(backup.st_mode & 07777, 0640u);
     for (const std::string& name : list_dir(s.tables()))
         EXPECT_EQ(name.find("VXAENV."), std::string::npos) << "scratch file left: " << name;
 }

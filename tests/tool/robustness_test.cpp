@@ -324,6 +324,8 @@ const ShapeCase kCases[] = {
     {"kmsenv_binary_garbage", {"file K " + garbage(65536)}, {}, 251, kOpen},
     {"kmsenv_empty", {"file K "}, {}, 251, kOpen},
     {"kmsenv_link_to_the_file", {"file R/kmsenv " + kConfig, "ln R/kmsenv K"}, {}, 0, ""},
+    {"kmsenv_another_accounts_link", {"file R/kmsenv " + kConfig, "ln R/kmsenv K", "own K"}, {}, 40, kKms},
+    {"kmsenv_another_server_ends_the_reading", {"file K " + kConfig + "SRV2|BINARCH|x|\nSRV1|BINARCH|aix536|\n"}, {}, 0, ""},
     {"kmsenv_dangling_link", {"ln R/gone K"}, {}, 2, kKms},
     {"kmsenv_directory", {"dir K"}, {}, 21, kKms},
     {"kmsenv_pipe", {"fifo K"}, {}, 22, kKms},
@@ -364,6 +366,7 @@ const ShapeCase kCases[] = {
     {"attack_log_fifo", {"fifo O/logs/qsdinst.log"}, {}, 248, "Error: Can't open <", "", -1, false, true},
     {"attack_seeding_log_fifo", {"fifo O/logs/kzr_a.sql.log"}, {}, 250, "Error: Seeding <kzr_a.sql> failed"},
     {"attack_image_link_out", {"file R/secret root only\n", "chmod 0600 R/secret", "ln R/secret T/stolen", "own T/stolen"}, {}, 251, "Error: Link <", "no H/stolen"},
+    {"attack_image_link_climbs_out", {"file R/secret root only\n", "ln ../../../../secret T/climb", "own T/climb"}, {}, 251, "Error: Link <", "no H/climb"},
     {"attack_image_root_link_out_followed", {"file R/shared shared\n", "ln R/shared T/shared"}, {}, 0, "", "is H/shared shared\n"},
     {"attack_image_inside_link_followed", {"ln I/ATTRLIB/kzr.atr T/inside", "own T/inside"}, {}, 0, "", "is H/inside name kzr\r\nattr one\r\n"},
     {"attack_image_writes_archive", {"file T/.archive/VXAENV_1 forged\n"}, {}, 251, "Error: The image may not write into <", "no H/.archive/VXAENV_1"},
@@ -638,6 +641,28 @@ TEST_P(Signals, StopBetweenFilesWithTheirStatusAndLine) {
     EXPECT_TRUE(vxaenv == zr7test::kSampleVxaenv || vxaenv == changed_by(zr7test::kSampleVxaenv, 1))
         << vxaenv;
     ::kill(-first, SIGKILL);  // nothing of the run may outlive the test
+}
+
+// A signal while the loader runs: seeding stops before the next file.
+TEST(Signals, StopBetweenSeededFiles) {
+    SampleInstall s;
+    for (int i = 0; i < 150; ++i) {
+        for (const std::string& dir : {s.image + "/MSRV/SQLLIB/", s.cicatrsq() + "/SQLLIB/"})
+            write_file(dir + "s" + std::to_string(i) + ".sql", "SELECT 1;\n");
+    }
+    const std::string out = s.root / "out", catalog = s.cicatrsq() + "/qdsload.catalog";
+    const int fd = ::open(out.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, 0644);
+    const pid_t first = start(s, {{"-s"}, true}, fd);
+    ::close(fd);
+    ASSERT_TRUE(poll_until([&] { return installing_pid(s) != 0 && zr7test::exists(catalog); }));
+    ::kill(installing_pid(s), SIGTERM);
+    EXPECT_EQ(wait_for(first), 143) << read_file(out);
+    const std::string loaded = read_file(catalog);
+    std::size_t files = 0;
+    for (std::size_t at = loaded.find(" loaded <"); at != loaded.npos;
+         at = loaded.find(" loaded <", at + 1))
+        ++files;
+    EXPECT_LT(files, 100u) << loaded;
 }
 
 INSTANTIATE_TEST_SUITE_P(All, Signals, ::testing::ValuesIn(kSignalCases),

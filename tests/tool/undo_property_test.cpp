@@ -55,6 +55,12 @@ TEST(Undo, LeavesAFileChangedSinceAndSaysSo) {
     ASSERT_EQ(install(s, {"-m", "kzr"}).exit_code, 0);
     write_file(s.tables() + "/table.dat", "edited by hand\n");         // replaced by the run
     write_file(s.tables() + "/TECLIB/kzr.baroc", "edited by hand\n");  // created by the run
+    // The journal names the backup of VXAENV the run made.
+    const std::vector<std::string> runs = list_dir(s.home + "/.zr7inst");
+    ASSERT_EQ(runs.size(), 1u);
+    EXPECT_NE(read_file(s.home + "/.zr7inst/" + runs[0] + "/journal")
+                  .find("\nbackup tables/SRV1/.archive/VXAENV_"),
+              std::string::npos);
     const RunResult u = undo(s);
     EXPECT_EQ(u.exit_code, 256 - 13) << u.out;
     EXPECT_EQ(read_file(s.tables() + "/table.dat"), "edited by hand\n");
