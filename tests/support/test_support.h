@@ -99,12 +99,6 @@ struct SampleInstall {
 inline const char* const kSampleVxaenv =  // what SampleInstall puts in VXAENV
     "# server environment\nKDS_START=1\nKDS_RUN=KDSMAIN;KDSTRACE\nCT_CMSLIST=IP.PIPE:#127.0.0.1\n";
 
-template <typename Body>
-std::string capture_stdout(Body body) {
-    ::testing::internal::CaptureStdout();
-    body();
-    return ::testing::internal::GetCapturedStdout();
-}
 // A trace line is "(<stamp> pid <n> <unit>:<line>) <message>\n".
 inline bool has_trace_line(const std::string& output, const std::string& message) {
     return output.find(") " + message + "\n") != std::string::npos;
