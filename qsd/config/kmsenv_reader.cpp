@@ -58,7 +58,7 @@ KmsenvResult read_kmsenv(const std::string& content, const ServerConfig& start) 
             c.server_name = owner;
             result.detail_lines.push_back("MSRV name <" + owner + ">");
         } else if (owner != c.server_name) {
-            continue;
+            break;
         }
         const std::string key = fields.next(separators);
         if (key == "BINARCH") {
