@@ -28,7 +28,7 @@ const char* const kUsageLines =
 
 // Options added since: one line each, after the fourteen.
 const char* const kAddedOptionLines[] = {
-    "  -n       Preview: print each change the installation would make,\n"
+    "  -n       Preview: print each change the installation would make,\n",
     "           and change nothing.\n",
     "  -u       Undo the newest installation not yet undone (no src_dir).\n",
     "  --help   Print this text on standard output and exit.\n",
