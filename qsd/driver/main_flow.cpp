@@ -217,12 +217,8 @@ int run_main(int argc, char** argv) {
     }
     installer.finish_plan(status);
     record.end = iso_local_time(static_cast<long>(std::time(nullptr)));
-    const auto absolute = [&installer](const std::string& path) {
-        return installer.working_dir.empty() || path[0] == '/' ? path
-                                                               : installer.working_dir + "/" + path;
-    };
-    record.home = absolute(home);
-    record.image = undo ? "" : absolute(src_dir);
+    record.home = installer.absolute(home);
+    record.image = undo ? "" : installer.absolute(src_dir);
     record.backup = progress.state().backup;
     record.undoes = installer.undone_run;
     status = keep_run_record(installer, record, status);

@@ -44,41 +44,6 @@ std::string position(const ProgressState& state) {
     return "[" + std::to_string(state.command) + "/" + std::to_string(state.commands) + "]";
 }
 
-// Length of the UTF-8 sequence that starts with `lead`, 0 when it cannot
-// start one.
-std::size_t sequence_length(unsigned char lead) {
-    if (lead < 0x80)
-        return 1;
-    if (lead >= 0xC2 && lead <= 0xDF)
-        return 2;
-    if (lead >= 0xE0 && lead <= 0xEF)
-        return 3;
-    if (lead >= 0xF0 && lead <= 0xF4)
-        return 4;
-    return 0;
-}
-
-// The code point of a well-formed sequence at `at`, or -1.
-long decode(const std::string& text, std::size_t at, std::size_t length) {
-    if (length == 0 || at + length > text.size())
-        return -1;
-    const auto lead = static_cast<unsigned char>(text[at]);
-    if (length == 1)
-        return lead;
-    long code = lead & (0x7F >> length);
-    for (std::size_t i = 1; i < length; ++i) {
-        const auto next = static_cast<unsigned char>(text[at + i]);
-        if ((next & 0xC0) != 0x80)
-            return -1;
-        code = (code << 6) | (next & 0x3F);
-    }
-    // Overlong forms, surrogates and code points past the last plane.
-    static const long kSmallest[] = {0, 0, 0x80, 0x800, 0x10000};
-    if (code < kSmallest[length] || (code >= 0xD800 && code <= 0xDFFF) || code > 0x10FFFF)
-        return -1;
-    return code;
-}
-
 // The first `columns` characters of a terminal-safe text.
 std::string first_columns(const std::string& text, std::size_t columns) {
     std::size_t seen = 0;
@@ -106,8 +71,8 @@ std::string terminal_safe(const std::string& text) {
     out.reserve(text.size());
     std::size_t i = 0;
     while (i < text.size()) {
-        const std::size_t length = sequence_length(static_cast<unsigned char>(text[i]));
-        const long code = decode(text, i, length);
+        std::size_t length = 0;
+        const long code = utf8_code_at(text, i, length);
         const bool printable = code >= 0x20 && code != 0x7F && !(code >= 0x80 && code < 0xA0);
         if (printable) {
             out.append(text, i, length);

@@ -21,18 +21,10 @@ void report(const std::string& path, int error) {
                  fs::error_text(error).c_str());
 }
 
-std::string absolute(const Installer610& installer, std::string path) {
-    if (!path.empty() && path[0] == '/')
-        return path;
-    while (path.compare(0, 2, "./") == 0)
-        path.erase(0, 2);
-    return installer.working_dir + "/" + path;
-}
-
 }  // namespace
 
 int keep_run_record(Installer610& installer, RunRecord& record, int status) {
-    const std::string store_path = absolute(installer, installer.home_path + kRunStoreName);
+    const std::string store_path = installer.absolute(installer.home_path + kRunStoreName);
     // A run that failed before it began its run directory begins one here.
     int error = 0;
     if (!installer.run_dir.valid())
@@ -68,7 +60,7 @@ int keep_run_record(Installer610& installer, RunRecord& record, int status) {
     if (error == 0)
         error = fs::write_all(json.get(), line);
     if (error != 0) {
-        report(absolute(installer, dir) + "qsdinst.json", error);
+        report(installer.absolute(dir) + "qsdinst.json", error);
         if (status == 0)
             status = zr7::kStatusCannotWrite;
     }

@@ -99,22 +99,6 @@ int copy_file_at(int src_fd, const struct stat& src_st, const std::string& src_s
 
 }  // namespace zr7
 
-namespace {
-
-std::string dir_of(const std::string& path) {
-    const std::size_t slash = path.find_last_of('/');
-    if (slash == std::string::npos)
-        return ".";
-    return slash == 0 ? "/" : path.substr(0, slash);
-}
-
-std::string name_of(const std::string& path) {
-    const std::size_t slash = path.find_last_of('/');
-    return slash == std::string::npos ? path : path.substr(slash + 1);
-}
-
-}  // namespace
-
 // The copy between two paths that the caller names: their directories are
 // taken as given, the names below them by the link rule.
 int InstallUtil::copy_file(const char* src, const char* dst, unsigned flags) {
@@ -124,11 +108,11 @@ int InstallUtil::copy_file(const char* src, const char* dst, unsigned flags) {
     zr7::fs::UniqueFd dst_dir;
     zr7::fs::UniqueFd file;
     struct stat st {};
-    if (zr7::fs::open_trusted_dir(dir_of(src), src_dir) != 0 ||
-        zr7::fs::open_read(src_dir.get(), name_of(src), file, st) != 0) {
+    if (zr7::fs::open_trusted_dir(zr7::dir_name(src), src_dir) != 0 ||
+        zr7::fs::open_read(src_dir.get(), zr7::base_name(src), file, st) != 0) {
         st = {};
     }
-    if (zr7::fs::open_trusted_dir(dir_of(dst), dst_dir) != 0)
+    if (zr7::fs::open_trusted_dir(zr7::dir_name(dst), dst_dir) != 0)
         return zr7::kStatusCopyFailed;
-    return zr7::copy_file_at(file.get(), st, src, dst_dir.get(), name_of(dst), dst, flags);
+    return zr7::copy_file_at(file.get(), st, src, dst_dir.get(), zr7::base_name(dst), dst, flags);
 }

@@ -157,13 +157,16 @@ int Installer610::begin_run_dir(bool with_journal) {
     return 0;
 }
 
+std::string Installer610::absolute(std::string path) const {
+    if (!path.empty() && path[0] == '/')
+        return path;
+    while (path.compare(0, 2, "./") == 0)
+        path.erase(0, 2);
+    return working_dir + (working_dir.empty() || working_dir.back() != '/' ? "/" : "") + path;
+}
+
 void Installer610::on_action(zr7::Action action, const std::string& path, const std::string& diff) {
-    std::string shown = path;
-    if (action != zr7::Action::kError && (shown.empty() || shown[0] != '/')) {
-        while (shown.compare(0, 2, "./") == 0)
-            shown.erase(0, 2);
-        shown = working_dir + (working_dir.empty() || working_dir.back() != '/' ? "/" : "") + shown;
-    }
+    const std::string shown = action == zr7::Action::kError ? path : absolute(path);
     plan.on_action(action, shown, diff);
     if (observer != nullptr)
         observer->on_action(action, shown, diff);

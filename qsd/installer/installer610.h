@@ -54,6 +54,8 @@ class Installer610 : public zr7::ActionSink {
     // Takes an action of the run: into the plan, and to the observer. Paths
     // are made absolute.
     void on_action(zr7::Action action, const std::string& path, const std::string& diff) override;
+    // A path the run names, made absolute against the working directory.
+    std::string absolute(std::string path) const;
     // Ends the plan of a run that ends with `status`: a failure adds its
     // "error" action, the first "Error:" line since the failing step began.
     void finish_plan(int status);

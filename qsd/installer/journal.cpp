@@ -52,23 +52,10 @@ int Journal::keep(int dir, const std::string& name, std::string& kept) {
         return error;
     // The old file itself, by a second name: no byte is copied.
     int error = fs::link_at(target.dir.get(), target.name, kept_dir_.get(), kept);
-    if (error == EXDEV || error == EPERM) {
-        // Another file system (or links refused there): a copy with the same
-        // bytes, mode, owner and group.
-        fs::UniqueFd old;
-        struct stat st {};
-        std::string content;
-        error = fs::open_read(target.dir.get(), target.name, old, st);
-        if (error == 0)
-            error = fs::read_all(old.get(), content);
-        fs::AtomicReplace copy(kept_dir_.get(), kept, false);
-        if (error == 0)
-            error = copy.open("kept");
-        if (error == 0)
-            error = fs::write_all(copy.fd(), content);
-        if (error == 0)
-            error = copy.commit_like(st);
-    }
+    // Across file systems, or where links are refused: the same bytes, mode,
+    // owner and group under the kept name.
+    if (error == EXDEV || error == EPERM)
+        error = fs::copy_like(target.dir.get(), target.name, kept_dir_.get(), kept, false);
     return error;
 }
 

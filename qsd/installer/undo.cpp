@@ -61,16 +61,6 @@ History read_history(const std::string& text) {
     return history;
 }
 
-std::string dir_part(const std::string& path) {
-    const std::size_t slash = path.find_last_of('/');
-    return slash == std::string::npos ? "." : path.substr(0, slash);
-}
-
-std::string name_part(const std::string& path) {
-    const std::size_t slash = path.find_last_of('/');
-    return slash == std::string::npos ? path : path.substr(slash + 1);
-}
-
 bool is_kept_name(const std::string& name) {
     return !name.empty() && name.size() < 12 &&
            std::all_of(name.begin(), name.end(), [](char c) { return c >= '0' && c <= '9'; });
@@ -98,19 +88,7 @@ std::string read_text(int dir, const std::string& name) {
 int put_back(int kept_dir, const std::string& kept, int dir, const std::string& name, bool sync) {
     int error = zr7::fs::rename_at(kept_dir, kept, dir, name);
     if (error == EXDEV) {
-        zr7::fs::UniqueFd file;
-        struct stat st {};
-        std::string content;
-        zr7::fs::AtomicReplace back(dir, name, sync);
-        error = zr7::fs::open_read(kept_dir, kept, file, st);
-        if (error == 0)
-            error = zr7::fs::read_all(file.get(), content);
-        if (error == 0)
-            error = back.open();
-        if (error == 0)
-            error = zr7::fs::write_all(back.fd(), content);
-        if (error == 0)
-            error = back.commit_like(st);
+        error = zr7::fs::copy_like(kept_dir, kept, dir, name, sync);
         if (error == 0)
             (void)zr7::fs::remove_file(kept_dir, kept);
     }
@@ -194,9 +172,9 @@ int Installer610::undo() {
         const std::string& relative = history.order[i];
         const PathHistory& path = history.paths[relative];
         const std::string shown = home + "/" + relative;
-        const std::string name = name_part(relative);
+        const std::string name = zr7::base_name(relative);
         zr7::fs::UniqueFd dir;
-        if (zr7::fs::open_dir_below(home_fd.get(), dir_part(relative), dir) != 0)
+        if (zr7::fs::open_dir_below(home_fd.get(), zr7::dir_name(relative), dir) != 0)
             continue;  // gone with its directory: nothing left to take back
         zr7::ContentDigest now;
         struct stat now_st {};
@@ -244,7 +222,7 @@ int Installer610::undo() {
             // The environment file as it is now is backed up first, under a
             // name no backup has.
             std::string backup;
-            const std::string dir_shown = home + "/" + dir_part(relative);
+            const std::string dir_shown = home + "/" + zr7::dir_name(relative);
             if (preview) {
                 backup = planned_env_backup(dir.get(), dir_shown);
             } else if (zr7::backup_content_at(dir.get(), dir_shown, name, before_text,

@@ -1,5 +1,4 @@
 #include "qsd/platform/directory_lock.h"
-#include "qsd/platform/status.h"
 
 #include <fcntl.h>
 #include <sys/file.h>
@@ -15,7 +14,9 @@
 #include <thread>
 #include <utility>
 
+#include "qsd/platform/fs.h"
 #include "qsd/platform/interruption.h"
+#include "qsd/platform/status.h"
 #include "qsd/platform/trace.h"
 
 namespace zr7 {
@@ -62,8 +63,8 @@ void record_holder(int lock_fd) {
     const int length = std::snprintf(text, sizeof text, "%d\n", static_cast<int>(::getpid()));
     // Only shown to a waiting run: a pid that cannot be written costs nothing
     // but the pid in its message.
-    if (::ftruncate(lock_fd, 0) == 0 && length > 0)
-        (void)!::pwrite(lock_fd, text, static_cast<std::size_t>(length), 0);
+    if (length > 0)
+        (void)fs::rewrite_file(lock_fd, std::string(text, static_cast<std::size_t>(length)));
 }
 
 std::string with_pid(const std::string& text, int pid) {
@@ -98,28 +99,31 @@ std::string root_lock_directory() {
 }
 
 int open_lock_directory(const std::string& path) {
-    if (::mkdir(path.c_str(), 0700) != 0 && errno != EEXIST)
-        return -1;
-    const int fd = ::open(path.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC);
-    struct stat st {};
-    if (fd < 0 || ::fstat(fd, &st) != 0)
-        return -1;
-    if (!S_ISDIR(st.st_mode) || st.st_uid != 0 || (st.st_mode & (S_IWGRP | S_IWOTH)) != 0) {
-        ::close(fd);
-        errno = EPERM;
+    // Made private when missing; one that another account owns or may write
+    // to, or a link, is refused.
+    const std::size_t slash = path.find_last_of('/');
+    fs::UniqueFd parent;
+    fs::UniqueFd dir;
+    int error = fs::open_trusted_dir(slash == 0 ? "/" : path.substr(0, slash), parent);
+    if (error == 0)
+        error = fs::make_private_dir(parent.get(), path.substr(slash + 1), dir);
+    if (error != 0) {
+        errno = error == fs::kNotPrivate ? EPERM : error == fs::kUntrustedLink ? ELOOP : error;
         return -1;
     }
-    return fd;
+    return dir.release();
 }
 
 DirectoryLock::DirectoryLock(const std::string& dir) {
     ZR7_TRACED("DirectoryLock");
     // The path is the administrator's (a home given as a link is fine); it
     // gives the identity that every run derives the same lock from.
-    fd_ = ::open(dir.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
+    fs::UniqueFd opened;
     struct stat st {};
-    if (fd_ < 0 || ::fstat(fd_, &st) != 0) {
-        error_ = errno;
+    error_ = fs::open_trusted_dir(dir, opened);
+    fd_ = opened.release();
+    if (error_ != 0 || ::fstat(fd_, &st) != 0) {
+        error_ = error_ != 0 ? error_ : errno;
         return;
     }
     dev_ = static_cast<unsigned long long>(st.st_dev);
@@ -142,11 +146,11 @@ DirectoryLock::DirectoryLock(const std::string& dir) {
         return;
     }
     const std::string name = lock_file_name(dev_, ino_);
-    lock_fd_ = ::openat(base, name.c_str(), O_RDWR | O_CREAT | O_NOFOLLOW | O_CLOEXEC, 0600);
-    error_ = errno;
+    fs::UniqueFd lock_file;
+    error_ = fs::open_private_file(base, name, lock_file);
+    lock_fd_ = lock_file.release();
     ::close(base);
-    struct stat lock_st {};
-    if (lock_fd_ < 0 || ::fstat(lock_fd_, &lock_st) != 0 || !S_ISREG(lock_st.st_mode)) {
+    if (error_ != 0) {
         failure_ = zr7::kStatusCannotOpen;
         ZR7_ERROR("Error: Can't open <%s/%s>", base_path.c_str(), name.c_str());
         return;

@@ -258,6 +258,18 @@ int stat_at(int dir, const std::string& name, struct stat& st) {
     return ::fstatat(dir, name.c_str(), &st, AT_SYMLINK_NOFOLLOW) == 0 ? 0 : errno;
 }
 
+namespace {
+
+// A file opened without blocking (a pipe in its place would have held the
+// open forever) reads and writes as usual once it is known to be regular.
+void blocking_again(int fd) {
+    const int flags = ::fcntl(fd, F_GETFL);
+    if (flags >= 0)
+        (void)::fcntl(fd, F_SETFL, flags & ~O_NONBLOCK);
+}
+
+}  // namespace
+
 int open_read(int dir, const std::string& name, UniqueFd& out, struct stat& st) {
     Target target;
     if (const int failed = resolve_name(dir, name, target))
@@ -274,9 +286,7 @@ int open_read(int dir, const std::string& name, UniqueFd& out, struct stat& st) 
         return EISDIR;
     if (!S_ISREG(st.st_mode))
         return EINVAL;
-    const int flags = ::fcntl(fd, F_GETFL);
-    if (flags >= 0)
-        (void)::fcntl(fd, F_SETFL, flags & ~O_NONBLOCK);
+    blocking_again(fd);
     out = std::move(file);
     return 0;
 }
@@ -321,9 +331,7 @@ int open_append(int dir, const std::string& name, UniqueFd& out) {
         if (const int failed = give_owner_of_dir(fd, target.dir.get()))
             return failed;
     }
-    const int now = ::fcntl(fd, F_GETFL);
-    if (now >= 0)
-        (void)::fcntl(fd, F_SETFL, now & ~O_NONBLOCK);
+    blocking_again(fd);
     out = std::move(file);
     return 0;
 }
@@ -359,6 +367,37 @@ int make_private_dir(int dir, const std::string& name, UniqueFd& out) {
         return kNotPrivate;
     }
     return 0;
+}
+
+int open_input(const std::string& path, UniqueFd& out) {
+    out.reset(::open(path.c_str(), O_RDONLY | O_CLOEXEC));
+    return out.valid() ? 0 : errno;
+}
+
+int open_output(const std::string& path, bool append, UniqueFd& out) {
+    out.reset(::open(path.c_str(), O_WRONLY | O_CREAT | O_CLOEXEC | (append ? O_APPEND : 0), 0666));
+    return out.valid() ? 0 : errno;
+}
+
+int truncate_file(int fd) {
+    return ::ftruncate(fd, 0) == 0 ? 0 : errno;
+}
+
+int rewrite_file(int fd, const std::string& content) {
+    if (::ftruncate(fd, 0) != 0)
+        return errno;
+    const ssize_t wrote = ::pwrite(fd, content.data(), content.size(), 0);
+    return wrote == static_cast<ssize_t>(content.size()) ? 0 : (wrote < 0 ? errno : EIO);
+}
+
+int open_private_file(int dir, const std::string& name, UniqueFd& out) {
+    out.reset(::openat(dir, name.c_str(), O_RDWR | O_CREAT | O_NOFOLLOW | O_CLOEXEC, 0600));
+    if (!out.valid())
+        return errno == ELOOP ? kUntrustedLink : errno;
+    struct stat st {};
+    if (::fstat(out.get(), &st) != 0)
+        return errno;
+    return S_ISREG(st.st_mode) ? 0 : kNotRegular;
 }
 
 int link_at(int from_dir, const std::string& from, int to_dir, const std::string& to) {
@@ -474,6 +513,23 @@ int AtomicReplace::put_in_place() {
     if (sync_ && ::fsync(dir_) != 0)
         return errno;
     return 0;
+}
+
+int copy_like(int from_dir, const std::string& from, int to_dir, const std::string& to, bool sync) {
+    UniqueFd file;
+    struct stat st {};
+    std::string content;
+    AtomicReplace copy(to_dir, to, sync);
+    int error = open_read(from_dir, from, file, st);
+    if (error == 0)
+        error = read_all(file.get(), content);
+    if (error == 0)
+        error = copy.open();
+    if (error == 0)
+        error = write_all(copy.fd(), content);
+    if (error == 0)
+        error = copy.commit_like(st);
+    return error;
 }
 
 int AtomicReplace::link_as(const std::string& name) {

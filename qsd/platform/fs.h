@@ -105,6 +105,21 @@ int make_dir(int dir, const std::string& name, UniqueFd& out, bool* created = nu
 // (kNotPrivate): what root reads back from it decides what root writes.
 int make_private_dir(int dir, const std::string& name, UniqueFd& out);
 
+// Opens a file by a path the caller chose, for a program's standard input,
+// or for its output (created when missing, 0666 less the umask; appended to
+// or written from the start). 0 or errno.
+int open_input(const std::string& path, UniqueFd& out);
+int open_output(const std::string& path, bool append, UniqueFd& out);
+// Empties an open file. 0 or errno.
+int truncate_file(int fd);
+// Replaces the whole content of an open file. 0 or errno.
+int rewrite_file(int fd, const std::string& content);
+
+// Opens `name` in `dir` for reading and writing, creating it (mode 0600)
+// when missing; never through a link, and only a regular file. 0 or an
+// error number.
+int open_private_file(int dir, const std::string& name, UniqueFd& out);
+
 // A second name for a file (the name itself, never a link's target), and a
 // rename, between two open directories. 0 or errno (EXDEV across file
 // systems, EEXIST for a link name that is taken).
@@ -169,6 +184,11 @@ class AtomicReplace {
     UniqueFd scratch_fd_;
     std::string scratch_;
 };
+
+// Copies the regular file `from` of `from_dir` to `to` in `to_dir` by an
+// atomic replace, with the same bytes, mode, owner and group: a file kept or
+// put back where a rename or a link cannot reach. 0 or an error number.
+int copy_like(int from_dir, const std::string& from, int to_dir, const std::string& to, bool sync);
 
 // Flushes the whole file system that holds `fd`. 0 or errno.
 int sync_filesystem(int fd);

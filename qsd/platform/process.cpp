@@ -14,6 +14,7 @@
 #include <optional>
 #include <utility>
 
+#include "qsd/platform/fs.h"
 #include "qsd/platform/interruption.h"
 
 extern char** environ;
@@ -27,21 +28,6 @@ bool is_executable_file(const std::string& path) {
     return ::stat(path.c_str(), &st) == 0 && S_ISREG(st.st_mode) &&
            ::access(path.c_str(), X_OK) == 0;
 }
-
-class FdGuard {
-  public:
-    explicit FdGuard(int fd = -1) : fd_(fd) {}
-    ~FdGuard() {
-        if (fd_ >= 0)
-            ::close(fd_);
-    }
-    FdGuard(const FdGuard&) = delete;
-    FdGuard& operator=(const FdGuard&) = delete;
-    int get() const { return fd_; }
-
-  private:
-    int fd_;
-};
 
 }  // namespace
 
@@ -150,7 +136,9 @@ ProcessResult run_process_ex(const ProcessSpec& job) {
     // otherwise cost an existing output its content. A descriptor the caller
     // gives was checked by the caller.
     const bool in_by_path = job.stdin_fd < 0 && !job.stdin_path.empty();
-    FdGuard in_guard(in_by_path ? ::open(job.stdin_path.c_str(), O_RDONLY | O_CLOEXEC) : -1);
+    fs::UniqueFd in_guard;
+    if (in_by_path)
+        (void)fs::open_input(job.stdin_path, in_guard);
     const int in_fd = job.stdin_fd >= 0 ? job.stdin_fd : in_guard.get();
     struct stat in_st {};
     if (in_by_path && (in_fd < 0 || ::fstat(in_fd, &in_st) != 0 || S_ISDIR(in_st.st_mode))) {
@@ -162,10 +150,9 @@ ProcessResult run_process_ex(const ProcessSpec& job) {
     // The output is truncated only once it is known not to be the input file
     // itself, which truncation would destroy before the program read it.
     const bool out_by_path = job.stdout_fd < 0 && job.stdout_mode != OutputMode::kInherit;
-    int out_flags = O_WRONLY | O_CREAT | O_CLOEXEC;
-    if (job.stdout_mode == OutputMode::kAppend)
-        out_flags |= O_APPEND;
-    FdGuard out_guard(out_by_path ? ::open(job.stdout_path.c_str(), out_flags, 0666) : -1);
+    fs::UniqueFd out_guard;
+    if (out_by_path)
+        (void)fs::open_output(job.stdout_path, job.stdout_mode == OutputMode::kAppend, out_guard);
     const int out_fd = job.stdout_fd >= 0 ? job.stdout_fd : out_guard.get();
     if (out_by_path) {
         struct stat out_st {};
@@ -174,7 +161,7 @@ ProcessResult run_process_ex(const ProcessSpec& job) {
         if (in_fd >= 0 && in_st.st_dev == out_st.st_dev && in_st.st_ino == out_st.st_ino)
             return failed(kRunStdoutFailed);
         if (job.stdout_mode == OutputMode::kTruncate && S_ISREG(out_st.st_mode) &&
-            ::ftruncate(out_fd, 0) != 0) {
+            fs::truncate_file(out_fd) != 0) {
             return failed(kRunStdoutFailed);
         }
     }

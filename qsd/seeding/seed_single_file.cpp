@@ -28,11 +28,6 @@ int run_loader(int response_fd, int log_fd) {
     return result == 0 ? 0 : -6;
 }
 
-std::string name_of(const std::string& path) {
-    const std::size_t slash = path.find_last_of('/');
-    return slash == std::string::npos ? path : path.substr(slash + 1);
-}
-
 }  // namespace
 
 int Installer610::seed_single_file(const std::string& dst_dir, const std::string& file_name) {
@@ -72,7 +67,7 @@ int Installer610::seed_single_file(const std::string& dst_dir, const std::string
     const std::string content = zr7::response_file_content(protocol, host_name, port, file_name);
     zr7::fs::UniqueFd tmp_dir;
     int error = zr7::fs::open_trusted_dir(tmp_path, tmp_dir);
-    const std::string response_name = name_of(response_path);
+    const std::string response_name = zr7::base_name(response_path);
     zr7::fs::AtomicReplace response(tmp_dir.get(), response_name, false);
     response.make_private();
     bool placed = false;

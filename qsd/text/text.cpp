@@ -70,4 +70,40 @@ std::string Tokenizer::next(const std::string& delimiters) {
     return piece;
 }
 
+std::string dir_name(const std::string& path) {
+    const std::size_t slash = path.find_last_of('/');
+    if (slash == std::string::npos)
+        return ".";
+    return slash == 0 ? "/" : path.substr(0, slash);
+}
+
+std::string base_name(const std::string& path) {
+    const std::size_t slash = path.find_last_of('/');
+    return slash == std::string::npos ? path : path.substr(slash + 1);
+}
+
+long utf8_code_at(const std::string& text, std::size_t at, std::size_t& length) {
+    const auto lead = static_cast<unsigned char>(text[at]);
+    length = lead < 0x80                    ? 1
+             : lead >= 0xC2 && lead <= 0xDF ? 2
+             : lead >= 0xE0 && lead <= 0xEF ? 3
+             : lead >= 0xF0 && lead <= 0xF4 ? 4
+                                            : 0;
+    if (length == 0 || at + length > text.size())
+        return -1;
+    if (length == 1)
+        return lead;
+    long code = lead & (0x7F >> length);
+    for (std::size_t i = 1; i < length; ++i) {
+        const auto next = static_cast<unsigned char>(text[at + i]);
+        if ((next & 0xC0) != 0x80)
+            return -1;
+        code = (code << 6) | (next & 0x3F);
+    }
+    static const long kSmallest[] = {0, 0, 0x80, 0x800, 0x10000};
+    if (code < kSmallest[length] || (code >= 0xD800 && code <= 0xDFFF) || code > 0x10FFFF)
+        return -1;
+    return code;
+}
+
 }  // namespace zr7

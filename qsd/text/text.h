@@ -29,6 +29,16 @@ std::string rstrip_space(const std::string& text);
 
 bool ends_with(const std::string& text, const std::string& suffix);
 
+// The code point of the well-formed UTF-8 sequence at `at`, its length in
+// `length`; -1 where none starts there (a stray byte, a sequence cut short,
+// an overlong form, a surrogate, a code point past the last plane).
+long utf8_code_at(const std::string& text, std::size_t at, std::size_t& length);
+
+// The directory part of a path ("." when it has none, "/" for a name right
+// below the root) and its last name.
+std::string dir_name(const std::string& path);
+std::string base_name(const std::string& path);
+
 // Splits a byte stream into lines, each with its "\n" kept; a last line without
 // one is returned as it is. Lines are whole whatever their length.
 StringList split_lines(const std::string& content);
